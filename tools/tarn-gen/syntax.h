@@ -1,0 +1,101 @@
+// The catalogue as written: one syntax tree per file, before any name is resolved.
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+namespace tarngen {
+
+// A position in a catalogue file, for messages.
+struct Location {
+    std::string file;
+    int line = 0;
+    std::string ToString() const { return file + ":" + std::to_string(line); }
+};
+
+// Every catalogue error: "file:line: message".
+class CatalogueError : public std::runtime_error {
+public:
+    CatalogueError(const Location& where, const std::string& message)
+        : std::runtime_error(where.ToString() + ": " + message), location(where) {}
+    Location location;
+};
+
+struct ParamSyntax {
+    Location where;
+    std::string name;
+    std::string type;
+    std::uint32_t flags = 0;
+    std::optional<std::string> version;
+};
+
+struct ResultSyntax {
+    Location where;
+    std::string type;
+    std::uint32_t flags = 0;
+    std::string version;
+};
+
+struct MethodSyntax {
+    Location where;
+    std::string name;
+    std::optional<std::string> wsdlName;
+    std::string version;
+    bool task = false;
+    std::optional<std::string> privilege;
+    std::vector<ParamSyntax> params;
+    std::optional<ResultSyntax> result;
+    std::vector<std::pair<Location, std::string>> faults;
+};
+
+struct PropertySyntax {
+    Location where;
+    std::string name;
+    std::string type;
+    std::uint32_t flags = 0;
+    std::string version;
+    std::optional<std::string> privilege;
+};
+
+enum class TypeKind { Data, Fault, Managed, Enum };
+
+struct TypeSyntax {
+    Location where;
+    TypeKind kind = TypeKind::Data;
+    std::string ns;    // the namespace in force where it was declared
+    std::string name;  // relative to ns, dotted when nested
+    std::optional<std::string> base;
+    std::string version;
+    std::vector<PropertySyntax> properties;
+    std::vector<MethodSyntax> methods;
+    std::vector<std::string> tags;
+    Location tagsWhere;
+};
+
+struct VersionSyntax {
+    Location where;
+    std::string name;
+    std::string serviceNamespace;
+    std::string versionId;
+    std::uint32_t flag = 0;
+    std::vector<std::string> includes;
+};
+
+// One catalogue file: a namespace file, a stand-in file or the version list.
+struct FileSyntax {
+    std::string path;
+    bool standin = false;
+    std::string unit;  // the namespace of a namespace file, the library of a stand-in file
+    std::vector<TypeSyntax> types;
+    std::vector<VersionSyntax> versions;
+    std::vector<std::string> loaders;
+    Location loadersWhere;
+};
+
+// Parses one file; throws CatalogueError on the first malformed line.
+FileSyntax ParseFile(const std::string& path, const std::string& text);
+
+}  // namespace tarngen
