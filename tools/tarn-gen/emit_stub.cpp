@@ -1,5 +1,6 @@
 // The namespace's stub source: client stubs that box arguments, pass the member's
 // method object and unbox the result.
+#include "call_code.h"
 #include "emit.h"
 #include "members.h"
 #include "names.h"
@@ -8,44 +9,25 @@
 namespace tarngen {
 namespace {
 
-void Boxing(Printer& out, const Member& m) {
-    for (std::size_t i = 0; i < m.params.size(); ++i) {
-        const MemberParam& p = m.params[i];
-        Printer::Vars vars = {{"i", std::to_string(i)}, {"name", p.name}, {"type", p.valueType}};
-        if (p.boxed) out.Print("    _args[$i$] = new Orbit::Primitive<$type$>($name$);\n", vars);
-        else out.Print("    _args[$i$] = $name$;\n", vars);
-    }
-}
-
 void StubMembers(Printer& out, const Unit& unit, const Type& t) {
-    Printer::Vars base = {{"cls", t.className}, {"name", t.name},
-                          {"stubBase", t.base->runtime ? "Orbit::StubImpl" : t.base->className + "Stub"}};
     out.Print("\n// $wire$\n"
               "$cls$Stub::$name$Stub(const std::string& id, Orbit::StubAdapter* adapter, Orbit::RequestContext* context)\n"
               "    : $stubBase$(id, adapter, context) {}\n"
               "$cls$Stub::~$name$Stub() = default;\n",
-              {{"wire", t.wireName}, {"cls", t.className}, {"name", t.name}, {"stubBase", base["stubBase"]}});
+              {{"wire", t.wireName}, {"cls", t.className}, {"name", t.name}, {"stubBase", t.base->runtime ? "Orbit::StubImpl" : t.base->className + "Stub"}});
     for (const Member& m : MembersOf(t)) {
         Printer::Vars vars = {{"cls", t.className}, {"ret", m.ReturnType()}, {"op", m.operation}, {"params", m.Parameters()},
                               {"async", m.AsyncParameters()}, {"n", std::to_string(m.params.size())},
-                              {"entry", names::MethodObjects(t.wireName) + "[" + std::to_string(m.memberNumber) + "]"},
-                              {"path", "\"" + unit.sourcePath + "/stub\""}, {"type", m.resultType}, {"result", m.resultName}};
+                              {"entry", names::MethodObjects(t.wireName) + "[" + std::to_string(m.memberNumber) + "]"}};
         out.Print("\n$ret$ $cls$Stub::$op$$params$ {\n"
                   "    Kernite::Ref<Orbit::Any> _result;\n"
                   "    Kernite::RefVector<Orbit::Any> _args($n$);\n",
                   vars);
-        Boxing(out, m);
+        BoxArguments(out, m);
         out.Print("    _Invoke_Task($entry$, _args, _result);\n", vars);
-        switch (m.delivery) {
-        case Delivery::Void: out.Print("    Orbit::CheckNoResult(_result, $path$, __LINE__);\n", vars); break;
-        case Delivery::ByValue: out.Print("    return Orbit::UnboxResult<$type$>(_result);\n", vars); break;
-        case Delivery::RefOut:
-            if (m.anyResult) out.Print("    $result$ = _result;\n", vars);
-            else out.Print("    Orbit::NarrowResult(_result, $result$);\n", vars);
-            break;
-        }
+        DeliverResult(out, m, unit.sourcePath + "/stub");
         out.Print("}\n\nvoid $cls$Stub::$op$$async$ {\n    Kernite::RefVector<Orbit::Any> _args($n$);\n", vars);
-        Boxing(out, m);
+        BoxArguments(out, m);
         out.Print("    _StartInvoke_Task($entry$, _args, callback, item);\n}\n", vars);
     }
 }

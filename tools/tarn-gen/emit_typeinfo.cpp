@@ -2,6 +2,7 @@
 // dispatch, tag tables and the loader.
 #include <set>
 
+#include "call_code.h"
 #include "emit.h"
 #include "members.h"
 #include "names.h"
@@ -307,18 +308,7 @@ private:
         for (const Member& m : members) {
             _out.Print("    case $n$: {  // $label$\n        Orbit::CheckArgumentCount(args, $count$);\n",
                        {{"n", std::to_string(m.memberNumber)}, {"label", m.label}, {"count", std::to_string(m.params.size())}});
-            std::string call;
-            for (std::size_t i = 0; i < m.params.size(); ++i) {
-                const MemberParam& p = m.params[i];
-                std::string arg = "arg" + std::to_string(i);
-                if (p.boxed)
-                    _out.Print("        const $type$& $arg$ = Orbit::UnboxArgument<$type$>(args, $i$);\n",
-                               {{"type", p.valueType}, {"arg", arg}, {"i", std::to_string(i)}});
-                else
-                    _out.Print("        $type$* $arg$ = Orbit::NarrowArgument<$type$>(args, $i$);\n",
-                               {{"type", p.valueType}, {"arg", arg}, {"i", std::to_string(i)}});
-                call += (i ? ", " : "") + arg;
-            }
+            std::string call = UnboxArguments(_out, m, "        ");
             Printer::Vars vars = {{"op", m.operation}, {"call", call}, {"type", m.resultType}};
             switch (m.delivery) {
             case Delivery::Void: _out.Print("        self->$op$($call$);\n", vars); break;

@@ -74,7 +74,11 @@ int main(int argc, char** argv) {
             WriteIfChanged(out / unit->header, tarngen::EmitHeader(model, *unit));
             WriteIfChanged(out / unit->outputDir / "typeinfo.cpp", tarngen::EmitTypeinfo(model, *unit));
             WriteIfChanged(out / unit->outputDir / "stub.cpp", tarngen::EmitStub(model, *unit));
+            if (unit->standin) continue;
+            WriteIfChanged(out / tarngen::DoublesHeaderPath(*unit), tarngen::EmitDoublesHeader(model, *unit));
+            WriteIfChanged(out / unit->outputDir / "doubles.cpp", tarngen::EmitDoubles(model, *unit));
         }
+        WriteIfChanged(out / "tarn/testing.h", tarngen::EmitDoublesUmbrella(model));
         WriteIfChanged(out / "tarn/versions.h", tarngen::EmitVersionsHeader(model));
         WriteIfChanged(out / "tarn/versions.cpp", tarngen::EmitVersions(model));
         WriteIfChanged(out / "tarn/types.h", tarngen::EmitUmbrella(model));

@@ -1,0 +1,27 @@
+// Checked downcasts.
+#pragma once
+
+#include <string>
+#include <typeinfo>
+
+#include "kernite/Exception.h"
+
+namespace Kernite {
+
+[[noreturn]] void ThrowTypeMismatch(const char* expected, const char* found);
+
+// Null yields null; an object that is not a T throws TypeMismatchException naming
+// the static types. Success allocates nothing.
+template <class T, class U>
+T* NarrowToType(U* p) {
+    if (p == nullptr) return nullptr;
+    if (T* t = dynamic_cast<T*>(p)) return t;
+    ThrowTypeMismatch(typeid(const T*).name(), typeid(const U*).name());
+}
+
+template <class T, class U>
+const T* NarrowToType(const U* p) {
+    return NarrowToType<T, U>(const_cast<U*>(p));
+}
+
+} // namespace Kernite

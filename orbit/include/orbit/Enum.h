@@ -1,0 +1,93 @@
+// Enumeration types: tags and their values (a tag's position in the tag table).
+#pragma once
+
+#include <boost/unordered_map.hpp>
+#include <string>
+#include <vector>
+
+#include "kernite/Exception.h"
+#include "kernite/Narrow.h"
+#include "kernite/Ref.h"
+#include "orbit/Array.h"
+#include "orbit/Primitive.h"
+#include "orbit/Type.h"
+
+namespace Orbit {
+
+class EnumType : public virtual Type {
+public:
+    virtual void GetEnumTags(std::vector<std::string>& out) const = 0;
+    // Unknown tags throw Kernite::InvalidArgumentException ("Invalid argument : <tag>").
+    virtual int GetValue(const std::string& tag) const = 0;
+    virtual bool HasValue(const std::string& tag) const = 0;
+    // Values outside 0 .. tags-1 throw ("Invalid argument : <value>").
+    virtual const std::string& GetTag(int value) const = 0;
+    virtual const std::string& EnumToString(Any* value) const = 0;
+    virtual void StringToEnum(const std::string& tag, Kernite::Ref<Any>& out) const = 0;
+    virtual void EnumArrayToStringArray(Any* values, Kernite::Ref<Array<std::string>>& out) const = 0;
+    virtual void StringArrayToEnumArray(Array<std::string>* tags, Kernite::Ref<Any>& out) const = 0;
+    virtual void CreateArrayInstance(Kernite::Ref<Any>& out) const = 0;
+};
+
+// Built once from the enumeration's record; read-only afterwards, so any thread may
+// use it without locking.
+template <class E>
+class EnumTypeImpl : public TypeImpl, public virtual EnumType {
+public:
+    explicit EnumTypeImpl(const EnumTypeInfo* record) : TypeImpl(record->header) {
+        for (int i = 0; record->tags[i] != nullptr; ++i) {
+            std::string tag(record->tags[i]);
+            _values[tag] = i;
+            _tags.push_back(std::move(tag));
+        }
+    }
+
+    void GetEnumTags(std::vector<std::string>& out) const override { out = _tags; }
+    int GetValue(const std::string& tag) const override {
+        auto it = _values.find(tag);
+        if (it == _values.end()) throw Kernite::InvalidArgumentException(tag);
+        return it->second;
+    }
+    bool HasValue(const std::string& tag) const override { return _values.find(tag) != _values.end(); }
+    const std::string& GetTag(int value) const override {
+        if (value < 0 || value >= static_cast<int>(_tags.size()))
+            throw Kernite::InvalidArgumentException(value);
+        return _tags[value];
+    }
+    const std::string& EnumToString(Any* value) const override {
+        return GetTag(static_cast<int>(Kernite::NarrowToType<Primitive<E>, Any>(value)->GetValue()));
+    }
+    void StringToEnum(const std::string& tag, Kernite::Ref<Any>& out) const override {
+        out = new Primitive<E>(static_cast<E>(GetValue(tag)));
+    }
+    void EnumArrayToStringArray(Any* values, Kernite::Ref<Array<std::string>>& out) const override {
+        const auto& items = Kernite::NarrowToType<Array<E>, Any>(values)->GetItems();
+        Kernite::Ref<Array<std::string>> strings(new Array<std::string>(items.size()));
+        for (std::size_t i = 0; i < items.size(); ++i)
+            strings->GetItems()[i] = GetTag(static_cast<int>(items[i]));
+        out = std::move(strings);
+    }
+    void StringArrayToEnumArray(Array<std::string>* tags, Kernite::Ref<Any>& out) const override {
+        const auto& names = tags->GetItems();
+        Kernite::Ref<Array<E>> values(new Array<E>(names.size()));
+        for (std::size_t i = 0; i < names.size(); ++i)
+            values->GetItems()[i] = static_cast<E>(GetValue(names[i]));
+        out = std::move(values);
+    }
+    void CreateArrayInstance(Kernite::Ref<Any>& out) const override { out = new Array<E>(); }
+
+private:
+    boost::unordered_map<std::string, int> _values;
+    std::vector<std::string> _tags;
+};
+
+// The type object of an enumeration, made once by its GetType<E>().
+template <class E>
+Type* CreateEnumType(const EnumTypeInfo* record) {
+    auto* type = new EnumTypeImpl<E>(record);
+    Kernite::Ref<TypeImpl> guard(type);  // released if registration throws
+    RegisterCreatedType(type);
+    return type;
+}
+
+}  // namespace Orbit

@@ -1,0 +1,139 @@
+#include <cstdint>
+#include <typeinfo>
+
+#include "kernite/Assert.h"
+#include "orbit/Any.h"
+#include "orbit/Array.h"
+#include "orbit/DataObject.h"
+#include "orbit/Type.h"
+
+namespace Orbit {
+namespace {
+
+// Same class, or both data objects when the comparison is not exact; anything else
+// differs without asking the item (boxes of another type would throw).
+bool Comparable(const Any* a, const Any* b, bool exact) {
+    if (typeid(*a) == typeid(*b)) return true;
+    return !exact && dynamic_cast<const DataObject*>(a) != nullptr && dynamic_cast<const DataObject*>(b) != nullptr;
+}
+
+}  // namespace
+
+unsigned int GetPrimitiveExtraSize(const std::string& value) {
+    // A short string keeps its text inside the object and owns no heap block.
+    const auto object = reinterpret_cast<std::uintptr_t>(&value);
+    const auto text = reinterpret_cast<std::uintptr_t>(value.data());
+    if (text >= object && text < object + sizeof(std::string)) return 0;
+    return static_cast<unsigned int>(value.capacity() + 1);
+}
+
+unsigned int GetPrimitiveExtraSize(const MethodName& value) { return GetPrimitiveExtraSize(value.GetName()); }
+
+unsigned int GetExtraSize(const std::vector<std::string>& items, SizeFunction f) {
+    unsigned int size = f(static_cast<unsigned int>(items.capacity() * sizeof(std::string)));
+    for (const std::string& item : items)
+        if (unsigned int extra = GetPrimitiveExtraSize(item)) size += f(extra);
+    return size;
+}
+
+Type* MoRef::_GetType() const { return Orbit::GetType<MoRef>(); }
+
+unsigned int MoRef::_GetSize(SizeFunction f) const {
+    unsigned int size = f(sizeof(MoRef));
+    if (unsigned int extra = GetPrimitiveExtraSize(_type)) size += f(extra);
+    if (unsigned int extra = GetPrimitiveExtraSize(_id)) size += f(extra);
+    return size;
+}
+
+Any* MoRef::_Clone() const { return new MoRef(*this); }
+
+bool MoRef::_IsEqual(Any* other, bool) const {
+    if (other == nullptr) Kernite::PanicAssert("obj", "orbit/MoRef", __LINE__);
+    auto* same = dynamic_cast<MoRef*>(other);
+    return same != nullptr && *same == *this;
+}
+
+void MoRef::_DiffProperties(Any* other, const std::string& path, PropertyDiffSet& diffs) const {
+    if (!_IsEqual(other)) diffs.Add(path);
+}
+
+std::string MoRef::ToString() const { return _type + ":" + _id; }
+
+bool DataArrayBase::_IsEqual(Any* other, bool exact) const {
+    if (other == nullptr) Kernite::PanicAssert("obj", "orbit/array", __LINE__);
+    auto* that = dynamic_cast<DataArrayBase*>(other);
+    if (that == nullptr || (exact && that->ArrayClass() != ArrayClass())) return false;
+    if (that == this) return true;
+    const int n = GetLength();
+    if (that->GetLength() != n) return false;
+    for (int i = 0; i < n; ++i) {
+        Any* a = ItemAt(i);
+        Any* b = that->ItemAt(i);
+        if (a == nullptr || b == nullptr) {
+            if (a != b) return false;
+        } else if (!Comparable(a, b, exact) || !a->_IsEqual(b, exact)) {
+            return false;
+        }
+    }
+    return true;
+}
+
+// Differing items are reported as "<path>[i]", recursing into items of the same class.
+void DataArrayBase::_DiffProperties(Any* other, const std::string& path, PropertyDiffSet& diffs) const {
+    if (other == nullptr) Kernite::PanicAssert("obj", "orbit/array", __LINE__);
+    auto* that = dynamic_cast<DataArrayBase*>(other);
+    if (that == nullptr || that->ArrayClass() != ArrayClass() || that->GetLength() != GetLength()) {
+        diffs.Add(path);
+        return;
+    }
+    for (int i = 0, n = GetLength(); i < n; ++i) {
+        Any* a = ItemAt(i);
+        Any* b = that->ItemAt(i);
+        const std::string itemPath = path + "[" + std::to_string(i) + "]";
+        if (a == nullptr || b == nullptr) {
+            if (a != b) diffs.Add(itemPath);
+        } else if (typeid(*a) != typeid(*b)) {
+            diffs.Add(itemPath);
+        } else {
+            a->_DiffProperties(b, itemPath, diffs);
+        }
+    }
+}
+
+DataObjectArrayBase::DataObjectArrayBase(const DataObjectArrayBase& other) : DataArrayBase() {
+    _vec.reserve(other._vec.size());
+    for (const auto& item : other._vec) _vec.emplace_back(item ? item->_Clone() : nullptr);
+}
+
+void DataObjectArrayBase::RemoveAt(int index) {
+    if (!(0 <= index && index < (int)_vec.size()))
+        Kernite::PanicAssert("0 <= index && index < (int)_vec.size()", "orbit/array", __LINE__);
+    _vec.erase(_vec.begin() + index);
+}
+
+void DataObjectArrayBase::Reserve(int capacity) {
+    if (capacity < 0) Kernite::PanicAssert("capacity >= 0", "orbit/array", __LINE__);
+    _vec.reserve(static_cast<std::size_t>(capacity));
+}
+
+unsigned int DataObjectArrayBase::_GetSize(SizeFunction f) const {
+    unsigned int size = sizeof(DataObjectArrayBase);
+    size += f(static_cast<unsigned int>(_vec.capacity() * sizeof(Kernite::Ref<Any>)));
+    for (const auto& item : _vec)
+        if (item) size += item->_GetSize(f);
+    return size;
+}
+
+void DataObjectArrayBase::SetAtInt(int index, Any* item) {
+    if (!(0 <= index && index < (int)_vec.size()))
+        Kernite::PanicAssert("0 <= index && index < (int)_vec.size()", "orbit/array", __LINE__);
+    _vec[index] = item;
+}
+
+void DataObjectArrayBase::InsertAtInt(int index, Any* item) {
+    if (!(0 <= index && index <= (int)_vec.size()))
+        Kernite::PanicAssert("0 <= index && index <= (int)_vec.size()", "orbit/array", __LINE__);
+    _vec.emplace(_vec.begin() + index, item);
+}
+
+}  // namespace Orbit

@@ -1,0 +1,13 @@
+#!/usr/bin/env bash
+# Installs what the build needs on Debian 12 (run as root). Does nothing when all is there.
+set -euo pipefail
+packages=(g++ cmake ninja-build libboost-dev libgtest-dev libgmock-dev libbenchmark-dev)
+missing=()
+for p in "${packages[@]}"; do
+  dpkg-query -W -f='${Status}' "$p" 2>/dev/null | grep -q "install ok installed" || missing+=("$p")
+done
+if [ ${#missing[@]} -gt 0 ]; then
+  export DEBIAN_FRONTEND=noninteractive
+  apt-get update -qq
+  apt-get install -y -qq --no-install-recommends "${missing[@]}"
+fi

@@ -1,0 +1,249 @@
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <memory>
+#include <mutex>
+
+#include "expect.h"
+#include "fixtures.h"
+
+using Kernite::ObjectImpl;
+using Kernite::Ref;
+using Kernite::System::ScheduledItem;
+using Orbit::Any;
+using Orbit::LoopbackAdapter;
+using Orbit::MethodFault;
+using Sample::BadRequest;
+using Sample::Calculator;
+using Sample::CalculatorImpl;
+using Sample::CalculatorStub;
+
+namespace {
+
+// What a completion callback saw, kept past the call.
+struct Completion {
+    std::mutex mutex;
+    int calls = 0;
+    ScheduledItem* item = nullptr;
+    std::unique_ptr<Kernite::Exception> failure;
+    Ref<Any> result;
+    bool itemWasPending = false;
+
+    Orbit::CompletionCallback Callback() {
+        return [this](ScheduledItem* done, Kernite::Exception* e, Any* value) {
+            std::lock_guard<std::mutex> lock(mutex);
+            ++calls;
+            item = done;
+            itemWasPending = !done->IsDone();
+            if (e) failure.reset(e->Clone());
+            result = value;
+        };
+    }
+};
+
+class LoopbackTest : public ::testing::Test {
+protected:
+    void SetUp() override {
+        Sample::CreateAllTypes();
+        _before = ObjectImpl::LiveObjects();
+        adapter = new LoopbackAdapter();
+        impl = new CalculatorImpl("calc-1");
+        adapter->Register("calc-1", impl.Get());
+        context = new Orbit::RequestContext();
+        Ref<Orbit::ManagedObject> made = adapter->CreateStub("calc-1", CalculatorType(), context.Get());
+        stub = Kernite::NarrowToType<CalculatorStub, Orbit::ManagedObject>(made.Get());
+    }
+    void TearDown() override {
+        stub = nullptr;
+        impl = nullptr;
+        context = nullptr;
+        adapter = nullptr;
+        EXPECT_EQ(ObjectImpl::LiveObjects(), _before);
+    }
+
+    static Orbit::ManagedObjectType* CalculatorType() {
+        return Orbit::GetTypeHelper<Calculator, Orbit::ManagedObjectType>();
+    }
+
+    // The fault of the Orbit::MethodFault::Exception (exactly) that `f` throws.
+    template <class F>
+    static Ref<MethodFault> FaultOf(F&& f) {
+        try {
+            f();
+        } catch (const MethodFault::Exception& e) {
+            EXPECT_EQ(typeid(e), typeid(MethodFault::Exception));
+            return Ref<MethodFault>(e.GetFault());
+        }
+        ADD_FAILURE() << "no fault";
+        return nullptr;
+    }
+
+    Ref<LoopbackAdapter> adapter;
+    Ref<CalculatorImpl> impl;
+    Ref<Orbit::RequestContext> context;
+    Ref<CalculatorStub> stub;
+
+private:
+    long _before = 0;
+};
+
+TEST_F(LoopbackTest, SynchronousCallsReachTheImplementation) {
+    EXPECT_EQ(stub->_GetStubAdapter(), adapter.Get());
+    EXPECT_EQ(stub->_GetRef()->GetType(), "test.Calculator");
+    EXPECT_EQ(stub->_GetRef()->GetId(), "calc-1");
+
+    EXPECT_EQ(stub->Add(2, 3), 5);
+    EXPECT_EQ(impl->seenContext, context.Get());
+    EXPECT_EQ(impl->seenThread, std::this_thread::get_id());
+    EXPECT_EQ(LoopbackAdapter::CurrentContext(), nullptr);
+
+    EXPECT_EQ(stub->GetName(), "calc:calc-1");
+
+    Ref<Any> sent(new Orbit::MoRef("test.Counter", "n"));
+    Ref<Any> echoed;
+    stub->Echo(sent.Get(), echoed);
+    EXPECT_EQ(echoed.Get(), sent.Get());
+    stub->Echo(nullptr, echoed);
+    EXPECT_EQ(echoed, nullptr);
+
+    Ref<Orbit::MoRef> task;
+    stub->StartJob(task);
+    ASSERT_TRUE(task);
+    EXPECT_EQ(task->GetId(), "task-1");
+
+    Ref<Orbit::RequestContext> other(new Orbit::RequestContext());
+    stub->_SetRequestContext(other.Get());
+    EXPECT_EQ(stub->_GetRequestContext(), other);
+    stub->Add(0, 0);
+    EXPECT_EQ(impl->seenContext, other.Get());
+}
+
+TEST_F(LoopbackTest, SynchronousFaultsArriveAsTheirOwnClass) {
+    try {
+        stub->Fail("bad input");
+        ADD_FAILURE() << "no fault";
+    } catch (const BadRequest::Exception& e) {
+        EXPECT_EQ(typeid(e), typeid(BadRequest::Exception));
+        ASSERT_NE(e.GetFault(), nullptr);
+        EXPECT_EQ(e.GetFault()->GetMsg(), "bad input");
+        EXPECT_STREQ(e.what(), "test.BadRequest");
+    }
+    EXPECT_EQ(LoopbackAdapter::CurrentContext(), nullptr);  // restored on the way out
+}
+
+TEST_F(LoopbackTest, UnknownObjectsAndMissingMembersAreFaults) {
+    Ref<Orbit::ManagedObject> made = adapter->CreateStub("calc-404", CalculatorType());
+    Ref<CalculatorStub> lost(Kernite::NarrowToType<CalculatorStub, Orbit::ManagedObject>(made.Get()));
+    Ref<MethodFault> fault = FaultOf([&] { lost->Add(1, 1); });
+    ASSERT_TRUE(fault);
+    EXPECT_NE(fault->GetMsg().find("calc-404"), std::string::npos) << fault->GetMsg();
+
+    // A counter's member asked of a calculator.
+    Kernite::RefVector<Any> args(0);
+    Ref<Any> result(new Orbit::Primitive<int>(0));
+    fault = FaultOf([&] { adapter->Invoke("calc-1", gTestCounterMethodObjects[0], args, result, nullptr); });
+    ASSERT_TRUE(fault);
+    EXPECT_NE(fault->GetMsg().find("test.Counter.increment"), std::string::npos) << fault->GetMsg();
+    EXPECT_NE(fault->GetMsg().find("test.Calculator"), std::string::npos) << fault->GetMsg();
+    EXPECT_EQ(result, nullptr);
+
+    fault = FaultOf([&] { adapter->Invoke("calc-1", nullptr, args, result, nullptr); });
+    EXPECT_TRUE(fault);
+
+    // Arguments that do not fit the method are the dispatcher's to refuse.
+    EXPECT_THROW(adapter->Invoke("calc-1", gTestCalculatorMethodObjects[0], args, result, nullptr),
+                 Kernite::InvalidArgumentException);
+}
+
+TEST_F(LoopbackTest, AsynchronousCallsCompleteThroughCallbackAndItem) {
+    Completion completion;
+    Ref<ScheduledItem> item;
+    stub->Add(20, 22, completion.Callback(), item);
+    ASSERT_TRUE(item);
+    item->Wait();
+
+    std::lock_guard<std::mutex> lock(completion.mutex);
+    EXPECT_EQ(completion.calls, 1);
+    EXPECT_EQ(completion.item, item.Get());
+    EXPECT_TRUE(completion.itemWasPending);  // the callback runs before completion
+    EXPECT_EQ(completion.failure, nullptr);
+    ASSERT_TRUE(completion.result);
+    EXPECT_EQ((Kernite::NarrowToType<Orbit::Primitive<int>, Any>(completion.result.Get())->GetValue()), 42);
+    EXPECT_EQ(item->GetState(), ScheduledItem::State::Done);
+    EXPECT_NE(impl->seenThread, std::this_thread::get_id());
+    EXPECT_EQ(impl->seenContext, context.Get());
+}
+
+TEST_F(LoopbackTest, AsynchronousFaultsReachCallbackAndItem) {
+    Completion completion;
+    Ref<ScheduledItem> item;
+    stub->Fail("later", completion.Callback(), item);
+    item->Wait();
+
+    EXPECT_TRUE(item->IsFailed());
+    auto* itemFailure = dynamic_cast<const BadRequest::Exception*>(item->GetException());
+    ASSERT_NE(itemFailure, nullptr);
+    EXPECT_EQ(itemFailure->GetFault()->GetMsg(), "later");
+
+    std::lock_guard<std::mutex> lock(completion.mutex);
+    EXPECT_EQ(completion.result, nullptr);
+    ASSERT_TRUE(completion.failure);
+    EXPECT_EQ(typeid(*completion.failure), typeid(BadRequest::Exception));
+    EXPECT_EQ(static_cast<MethodFault::Exception&>(*completion.failure).GetFault(), itemFailure->GetFault());
+
+    Ref<Orbit::ManagedObject> made = adapter->CreateStub("calc-404", CalculatorType());
+    Ref<CalculatorStub> lost(Kernite::NarrowToType<CalculatorStub, Orbit::ManagedObject>(made.Get()));
+    Ref<ScheduledItem> lostItem;
+    lost->Add(1, 2, Orbit::CompletionCallback(), lostItem);  // no callback: the item alone tells
+    lostItem->Wait();
+    ASSERT_TRUE(lostItem->IsFailed());
+    EXPECT_EQ(typeid(*lostItem->GetException()), typeid(MethodFault::Exception));
+}
+
+TEST_F(LoopbackTest, ShutdownDrainsQueuedCallsAndRefusesNewOnes) {
+    std::atomic<int> callbacks{0};
+    std::vector<Ref<ScheduledItem>> items(50);
+    for (int i = 0; i < 50; ++i)
+        stub->Add(i, i, [&callbacks](ScheduledItem*, Kernite::Exception*, Any*) { ++callbacks; }, items[i]);
+    adapter->Shutdown();
+    for (const auto& item : items) EXPECT_EQ(item->GetState(), ScheduledItem::State::Done);
+    EXPECT_EQ(callbacks.load(), 50);
+
+    Ref<ScheduledItem> refused;
+    EXPECT_THROW(stub->Add(1, 1, Orbit::CompletionCallback(), refused), Kernite::Exception);
+    EXPECT_FALSE(refused);
+    adapter->Shutdown();
+    EXPECT_EQ(stub->Add(1, 1), 2);  // synchronous calls need no worker
+}
+
+TEST_F(LoopbackTest, RegistrationTellsReplacedAndRemovedObjects) {
+    Ref<CalculatorImpl> second(new CalculatorImpl("calc-1"));
+    adapter->Register("calc-1", second.Get());
+    EXPECT_EQ(impl->unregistered, 1);
+    EXPECT_EQ(stub->GetName(), "calc:calc-1");
+    stub->Add(1, 1);
+    EXPECT_EQ(second->seenThread, std::this_thread::get_id());
+
+    adapter->Unregister("calc-1");
+    adapter->Unregister("calc-1");
+    EXPECT_EQ(second->unregistered, 1);
+    EXPECT_TRUE(FaultOf([&] { stub->Add(1, 1); }));
+
+    adapter->Register("calc-1", impl.Get());
+    adapter = nullptr;  // the stub keeps the adapter alive
+    EXPECT_EQ(stub->Add(2, 2), 4);
+    stub = nullptr;  // last reference: the adapter goes, and tells what it hosted
+    EXPECT_EQ(impl->unregistered, 2);
+}
+
+TEST_F(LoopbackTest, RequestContextsHoldValuesByKey) {
+    Ref<Any> user(new Orbit::Primitive<std::string>("admin"));
+    context->SetValue("user", user.Get());
+    EXPECT_EQ(context->GetValue("user"), user.Get());
+    EXPECT_EQ(context->GetValue("session"), nullptr);
+    context->SetValue("user", nullptr);
+    EXPECT_EQ(context->GetValue("user"), nullptr);
+    EXPECT_EQ(user->GetRefCount(), 1);
+}
+
+}  // namespace
