@@ -97,6 +97,13 @@ private:
         _out.Raw("    {nullptr, nullptr, 0, nullptr, Orbit::Flag::End, nullptr},\n};\n");
     }
 
+    // A catalogued base's type object is made first, so that walks up the base chain
+    // (equality, differences, IsA) find it even before its loader registered it.
+    static std::string WithBase(const Type& t, const std::string& creation) {
+        if (t.base->runtime) return creation;
+        return "(Orbit::GetType<" + t.base->className + ">(), " + creation + ")";
+    }
+
     void GetTypeDefinition(const Type& t, const std::string& creation) {
         _out.Print("\ntemplate <>\nOrbit::Type* Orbit::GetType<$cls$>() {\n"
                    "    static Orbit::Type* const type = $creation$;\n"
@@ -121,7 +128,7 @@ private:
                    "}  // namespace\n",
                    {{"rec", Local(t, "Record")}, {"header", t.record}, {"base", t.base->record}, {"props", Local(t, "Properties")},
                     {"access", "Orbit::RecordAccess<" + t.className + ">"}});
-        GetTypeDefinition(t, "Orbit::CreateDataObjectType(&" + Local(t, "Record") + ")");
+        GetTypeDefinition(t, WithBase(t, "Orbit::CreateDataObjectType(&" + Local(t, "Record") + ")"));
         _out.Print("\ntemplate class Orbit::DataArray<$cls$>;\n", {{"cls", t.className}});
     }
 
@@ -272,7 +279,7 @@ private:
                    {{"create", "Create" + t.flatName + "Stub"}, {"cls", t.className}, {"rec", Local(t, "Record")},
                     {"header", t.record}, {"base", t.base->record}, {"props", Local(t, "Properties")},
                     {"methods", Local(t, "Methods")}, {"invoke", "Invoke" + t.flatName}, {"objects", vars["objects"]}});
-        GetTypeDefinition(t, "Orbit::CreateManagedObjectType(&" + Local(t, "Record") + ")");
+        GetTypeDefinition(t, WithBase(t, "Orbit::CreateManagedObjectType(&" + Local(t, "Record") + ")"));
     }
 
     void MethodLists(const Type& t, const Method& m) {

@@ -55,19 +55,24 @@ public:
         return _tags[value];
     }
     const std::string& EnumToString(Any* value) const override {
-        return GetTag(static_cast<int>(Kernite::NarrowToType<Primitive<E>, Any>(value)->GetValue()));
+        auto* box = Kernite::NarrowToType<Primitive<E>, Any>(value);
+        if (box == nullptr) throw Kernite::InvalidArgumentException(std::string("null"));
+        return GetTag(static_cast<int>(box->GetValue()));
     }
     void StringToEnum(const std::string& tag, Kernite::Ref<Any>& out) const override {
         out = new Primitive<E>(static_cast<E>(GetValue(tag)));
     }
     void EnumArrayToStringArray(Any* values, Kernite::Ref<Array<std::string>>& out) const override {
-        const auto& items = Kernite::NarrowToType<Array<E>, Any>(values)->GetItems();
+        auto* array = Kernite::NarrowToType<Array<E>, Any>(values);
+        if (array == nullptr) throw Kernite::InvalidArgumentException(std::string("null"));
+        const auto& items = array->GetItems();
         Kernite::Ref<Array<std::string>> strings(new Array<std::string>(items.size()));
         for (std::size_t i = 0; i < items.size(); ++i)
             strings->GetItems()[i] = GetTag(static_cast<int>(items[i]));
         out = std::move(strings);
     }
     void StringArrayToEnumArray(Array<std::string>* tags, Kernite::Ref<Any>& out) const override {
+        if (tags == nullptr) throw Kernite::InvalidArgumentException(std::string("null"));
         const auto& names = tags->GetItems();
         Kernite::Ref<Array<E>> values(new Array<E>(names.size()));
         for (std::size_t i = 0; i < names.size(); ++i)
