@@ -43,8 +43,12 @@ public:
             _out.Print("constinit const Orbit::TypeInfo $record$ = {$kind$, $wire$, $flat$, $version$};\n",
                        {{"record", t->record}, {"kind", Hex(KindCode(t->kind))}, {"wire", Quote(t->wireName)},
                         {"flat", Quote(t->flatName)}, {"version", Quote(t->version)}});
-        _out.Raw("\nnamespace {\nconstinit const Orbit::ParamInfo kNoParams[] = {{nullptr, 0, nullptr, Orbit::Flag::End, nullptr}};\n"
-                 "constinit const Orbit::TypeInfo* const kNoFaults[] = {nullptr};\n}  // namespace\n");
+        bool managed = false;
+        for (const Type* t : _unit.types) managed = managed || t->kind == Kind::Managed;
+        if (managed)
+            _out.Raw("\nnamespace {\n// Shared by every method without parameters or declared faults.\n"
+                     "constinit const Orbit::ParamInfo kNoParams[] = {{nullptr, 0, nullptr, Orbit::Flag::End, nullptr}};\n"
+                     "constinit const Orbit::TypeInfo* const kNoFaults[] = {nullptr};\n}  // namespace\n");
         for (const Type* t : _unit.types) {
             switch (t->kind) {
             case Kind::Enum: Enumeration(*t); break;
