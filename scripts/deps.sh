@@ -1,7 +1,8 @@
 #!/usr/bin/env bash
 # Installs what the build needs on Debian 12 (run as root). Does nothing when all is there.
 set -euo pipefail
-packages=(g++ cmake ninja-build libboost-dev libgtest-dev libgmock-dev libbenchmark-dev)
+packages=(g++ cmake ninja-build libboost-dev libgtest-dev libgmock-dev libbenchmark-dev
+          clang-14 libclang-rt-14-dev)  # clang and its libFuzzer, for the fuzz preset
 missing=()
 for p in "${packages[@]}"; do
   dpkg-query -W -f='${Status}' "$p" 2>/dev/null | grep -q "install ok installed" || missing+=("$p")

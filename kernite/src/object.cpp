@@ -5,39 +5,101 @@
 #include <cstdio>
 #include <cstdlib>
 #include <memory>
+#include <new>
 
 #include "kernite/Assert.h"
 
 namespace Kernite {
 namespace {
-std::atomic<long> gLiveObjects{0};
-}
 
-ObjectImpl::ObjectImpl() noexcept { gLiveObjects.fetch_add(1, std::memory_order_relaxed); }
+// Live objects are counted per thread, so that making and ending an object costs no
+// atomic read-modify-write: each thread adds to a counter of its own, and only that
+// thread writes it. An object ended on another thread than the one that made it
+// leaves one counter one lower and another one higher; only the sum means anything.
+// A thread's counter goes back to a free list when the thread ends, with its count,
+// and the next new thread carries on from there.
+struct LiveCounter {
+    std::atomic<long> count{0};
+    std::atomic<bool> taken{true};
+    LiveCounter* next = nullptr;
+};
 
-ObjectImpl::ObjectImpl(const ObjectImpl&) noexcept : Object() {
-    gLiveObjects.fetch_add(1, std::memory_order_relaxed);
-}
+std::atomic<LiveCounter*> gCounters{nullptr};
+// Objects counted while their thread has no counter of its own: when none could be
+// allocated, or while the thread is ending.
+std::atomic<long> gUncounted{0};
 
-ObjectImpl::~ObjectImpl() { gLiveObjects.fetch_sub(1, std::memory_order_relaxed); }
+[[gnu::tls_model("initial-exec")]] thread_local LiveCounter* tCounter = nullptr;
+[[gnu::tls_model("initial-exec")]] thread_local bool tEnded = false;
 
-long ObjectImpl::LiveObjects() noexcept { return gLiveObjects.load(std::memory_order_relaxed); }
-
-void ObjectImpl::IncRef() const {
-    if (_refCount.fetch_add(1, std::memory_order_relaxed) == 0)
-        const_cast<ObjectImpl*>(this)->FirstIncRef(typeid(*this));
-}
-
-void ObjectImpl::DecRef() const {
-    const int previous = _refCount.fetch_sub(1, std::memory_order_acq_rel);
-    if (previous == 1) {
-        auto* self = const_cast<ObjectImpl*>(this);
-        self->FinalDecRef(typeid(*this));
-        delete self;
-    } else if (previous <= 0) {
-        PanicAssert("_refCount > 0", "kernite/Object", __LINE__);
+LiveCounter* ClaimCounter() noexcept {
+    for (LiveCounter* c = gCounters.load(std::memory_order_acquire); c != nullptr; c = c->next) {
+        bool free = false;
+        if (!c->taken.load(std::memory_order_relaxed) &&
+            c->taken.compare_exchange_strong(free, true, std::memory_order_acquire))
+            return c;
     }
+    // Never freed, and not from operator new: counting must not fail or throw.
+    void* memory = std::malloc(sizeof(LiveCounter));
+    if (memory == nullptr) return nullptr;
+    auto* c = new (memory) LiveCounter();
+    c->next = gCounters.load(std::memory_order_relaxed);
+    while (!gCounters.compare_exchange_weak(c->next, c, std::memory_order_release, std::memory_order_relaxed)) {
+    }
+    return c;
 }
+
+// Gives the thread's counter back when the thread ends; objects ended later on this
+// thread (by other thread-local destructors) count in gUncounted.
+struct CounterRelease {
+    ~CounterRelease() {
+        LiveCounter* c = tCounter;
+        tCounter = nullptr;
+        tEnded = true;
+        if (c != nullptr) c->taken.store(false, std::memory_order_release);
+    }
+};
+
+void CountLive(long delta) noexcept {
+    if (LiveCounter* c = tCounter) {
+        c->count.store(c->count.load(std::memory_order_relaxed) + delta, std::memory_order_relaxed);
+        return;
+    }
+    if (!tEnded) {
+        if (LiveCounter* c = ClaimCounter()) {
+            tCounter = c;
+            thread_local CounterRelease release;
+            (void)release;
+            c->count.store(c->count.load(std::memory_order_relaxed) + delta, std::memory_order_relaxed);
+            return;
+        }
+    }
+    gUncounted.fetch_add(delta, std::memory_order_relaxed);
+}
+
+}  // namespace
+
+ObjectImpl::ObjectImpl() noexcept { CountLive(1); }
+
+ObjectImpl::ObjectImpl(const ObjectImpl&) noexcept : Object() { CountLive(1); }
+
+ObjectImpl::~ObjectImpl() { CountLive(-1); }
+
+long ObjectImpl::LiveObjects() noexcept {
+    long live = gUncounted.load(std::memory_order_relaxed);
+    for (LiveCounter* c = gCounters.load(std::memory_order_acquire); c != nullptr; c = c->next)
+        live += c->count.load(std::memory_order_relaxed);
+    return live;
+}
+
+void ObjectImpl::Destroy() const {
+    _refCount.store(0, std::memory_order_relaxed);
+    auto* self = const_cast<ObjectImpl*>(this);
+    self->FinalDecRef(typeid(*this));
+    delete self;
+}
+
+void ObjectImpl::ReleasedTooOften() { PanicAssert("_refCount > 0", "kernite/Object", __LINE__); }
 
 int ObjectImpl::GetRefCount() const { return _refCount.load(std::memory_order_relaxed); }
 

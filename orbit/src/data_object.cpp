@@ -6,6 +6,7 @@
 #include "kernite/Narrow.h"
 #include "kernite/System.h"
 #include "orbit/DataObject.h"
+#include "orbit/Dispatch.h"
 
 namespace Orbit {
 namespace {
@@ -191,7 +192,7 @@ DataObjectType* MethodFault::_GetDataType() const { return GetDoType<MethodFault
 
 unsigned int MethodFault::_GetSize(SizeFunction f) const {
     unsigned int size = DynamicData::_GetSize(f) - f(sizeof(DynamicData)) + f(sizeof(MethodFault));
-    size += f(static_cast<unsigned int>(_msg.capacity()));
+    size += f(GetPrimitiveExtraSize(_msg));
     if (_faultCause) size += _faultCause->_GetSize(f);
     if (const auto* data = _faultData.Peek()) size += data->_GetSize(f);
     return size;
@@ -217,7 +218,7 @@ DataObjectType* KeyAnyValue::_GetDataType() const { return GetDoType<KeyAnyValue
 
 unsigned int KeyAnyValue::_GetSize(SizeFunction f) const {
     unsigned int size = DynamicData::_GetSize(f) - f(sizeof(DynamicData)) + f(sizeof(KeyAnyValue));
-    size += f(static_cast<unsigned int>(_key.capacity()));
+    size += f(GetPrimitiveExtraSize(_key));
     if (_value) size += _value->_GetSize(f);
     return size;
 }
@@ -251,19 +252,19 @@ constexpr PropertyInfo kMethodFaultProperties[] = {
 };
 
 void GetMethodFaultProperty(DataObject* object, int index, void* value) {
-    MethodFault* fault = Kernite::NarrowToType<MethodFault, DataObject>(object);
+    MethodFault* fault = NarrowTarget<MethodFault, DataObject>(object);
     switch (index) {
-        case kMsg: *static_cast<std::string*>(value) = fault->GetMsg(); break;
-        case kFaultCause: *static_cast<Kernite::Ref<Any>*>(value) = fault->GetFaultCause(); break;
-        case kFaultData: *static_cast<Kernite::Ref<Any>*>(value) = fault->GetFaultData(); break;
+        case kMsg: WriteValue<std::string>(value) = fault->GetMsg(); break;
+        case kFaultCause: WriteValue<Kernite::Ref<Any>>(value) = fault->GetFaultCause(); break;
+        case kFaultData: WriteValue<Kernite::Ref<Any>>(value) = fault->GetFaultData(); break;
         default: break;
     }
 }
 
 void SetMethodFaultProperty(DataObject* object, int index, const void* value) {
-    MethodFault* fault = Kernite::NarrowToType<MethodFault, DataObject>(object);
+    MethodFault* fault = NarrowTarget<MethodFault, DataObject>(object);
     switch (index) {
-        case kMsg: fault->SetMsg(*static_cast<const std::string*>(value)); break;
+        case kMsg: fault->SetMsg(ReadValue<std::string>(value)); break;
         case kFaultCause: fault->SetFaultCause(Kernite::NarrowToType<MethodFault, Any>(HeldValue(value))); break;
         case kFaultData:
             fault->SetFaultData(Kernite::NarrowToType<DataArray<KeyAnyValue>, Any>(HeldValue(value)));
@@ -273,7 +274,7 @@ void SetMethodFaultProperty(DataObject* object, int index, const void* value) {
 }
 
 bool IsMethodFaultPropertySet(DataObject* object, int index) {
-    MethodFault* fault = Kernite::NarrowToType<MethodFault, DataObject>(object);
+    MethodFault* fault = NarrowTarget<MethodFault, DataObject>(object);
     switch (index) {
         case kFaultCause: return fault->GetFaultCause() != nullptr;
         case kFaultData: return !fault->GetFaultData()->IsEmpty();
@@ -282,7 +283,7 @@ bool IsMethodFaultPropertySet(DataObject* object, int index) {
 }
 
 void UnsetMethodFaultProperty(DataObject* object, int index) {
-    MethodFault* fault = Kernite::NarrowToType<MethodFault, DataObject>(object);
+    MethodFault* fault = NarrowTarget<MethodFault, DataObject>(object);
     switch (index) {
         case kFaultCause: fault->SetFaultCause(nullptr); break;
         case kFaultData: fault->SetFaultData(new DataArray<KeyAnyValue>()); break;
@@ -302,25 +303,25 @@ constexpr PropertyInfo kKeyAnyValueProperties[] = {
 };
 
 void GetKeyAnyValueProperty(DataObject* object, int index, void* value) {
-    KeyAnyValue* kav = Kernite::NarrowToType<KeyAnyValue, DataObject>(object);
+    KeyAnyValue* kav = NarrowTarget<KeyAnyValue, DataObject>(object);
     switch (index) {
-        case kKey: *static_cast<std::string*>(value) = kav->GetKey(); break;
-        case kValue: *static_cast<Kernite::Ref<Any>*>(value) = kav->GetValue(); break;
+        case kKey: WriteValue<std::string>(value) = kav->GetKey(); break;
+        case kValue: WriteValue<Kernite::Ref<Any>>(value) = kav->GetValue(); break;
         default: break;
     }
 }
 
 void SetKeyAnyValueProperty(DataObject* object, int index, const void* value) {
-    KeyAnyValue* kav = Kernite::NarrowToType<KeyAnyValue, DataObject>(object);
+    KeyAnyValue* kav = NarrowTarget<KeyAnyValue, DataObject>(object);
     switch (index) {
-        case kKey: kav->SetKey(*static_cast<const std::string*>(value)); break;
+        case kKey: kav->SetKey(ReadValue<std::string>(value)); break;
         case kValue: kav->SetValue(HeldValue(value)); break;
         default: break;
     }
 }
 
 bool IsKeyAnyValuePropertySet(DataObject* object, int index) {
-    KeyAnyValue* kav = Kernite::NarrowToType<KeyAnyValue, DataObject>(object);
+    KeyAnyValue* kav = NarrowTarget<KeyAnyValue, DataObject>(object);
     return index != kValue || kav->GetValue() != nullptr;
 }
 

@@ -147,44 +147,53 @@ void LoopbackAdapter::StartInvoke(const std::string& id, ManagedMethod* method, 
         started->Complete(failure.get());
     };
     {
-        std::lock_guard<std::mutex> lock(_queueMutex);
-        if (_stopping) throw Kernite::Exception("loopback adapter is shut down");
-        if (!_worker.joinable()) _worker = std::thread(&LoopbackAdapter::WorkerLoop, this);
-        _queue.emplace_back(std::move(call));
+        std::lock_guard<std::mutex> lock(_queue->mutex);
+        if (_queue->stopping) throw Kernite::Exception("loopback adapter is shut down");
+        if (!_worker.joinable()) _worker = std::thread(&LoopbackAdapter::WorkerLoop, _queue);
+        _queue->calls.emplace_back(std::move(call));
     }
-    _queueReady.notify_one();
+    _queue->ready.notify_one();
     item = std::move(started);
 }
 
 void LoopbackAdapter::Shutdown() {
     std::thread worker;
     {
-        std::lock_guard<std::mutex> lock(_queueMutex);
-        _stopping = true;
+        std::lock_guard<std::mutex> lock(_queue->mutex);
+        _queue->stopping = true;
         worker = std::move(_worker);
     }
-    _queueReady.notify_all();
+    _queue->ready.notify_all();
     if (!worker.joinable()) return;
-    // Joining from the worker itself would wait forever: the adapter was released
-    // by one of its own completion callbacks.
-    if (worker.get_id() == std::this_thread::get_id())
-        Kernite::PanicAssert("worker.get_id() != std::this_thread::get_id()", "orbit/loopback", __LINE__);
-    worker.join();
+    if (worker.get_id() != std::this_thread::get_id()) {
+        worker.join();
+        return;
+    }
+    // On the worker itself, which cannot wait for itself: the queued calls still
+    // need this adapter, so they run here and now, in order, as the worker would
+    // have run them. The worker then finds the queue empty and ends on its own,
+    // touching only the shared queue, never this adapter.
+    while (std::function<void()> call = _queue->Next(false)) call();
+    worker.detach();
 }
 
 RequestContext* LoopbackAdapter::CurrentContext() { return tCurrentContext; }
 
-void LoopbackAdapter::WorkerLoop() {
-    for (;;) {
-        std::function<void()> call;
-        {
-            std::unique_lock<std::mutex> lock(_queueMutex);
-            _queueReady.wait(lock, [this] { return _stopping || !_queue.empty(); });
-            if (_queue.empty()) return;  // stopping, and drained
-            call = std::move(_queue.front());
-            _queue.pop_front();
-        }
+std::function<void()> LoopbackAdapter::WorkQueue::Next(bool wait) {
+    std::unique_lock<std::mutex> lock(mutex);
+    if (wait) ready.wait(lock, [this] { return stopping || !calls.empty(); });
+    if (calls.empty()) return nullptr;
+    std::function<void()> call = std::move(calls.front());
+    calls.pop_front();
+    return call;
+}
+
+void LoopbackAdapter::WorkerLoop(std::shared_ptr<WorkQueue> queue) {
+    // A call may release the adapter's last reference (its callback holds it), so
+    // the call is destroyed before the queue is looked at again.
+    while (std::function<void()> call = queue->Next(true)) {
         call();
+        call = nullptr;
     }
 }
 

@@ -1,5 +1,11 @@
+#include <atomic>
 #include <cstdint>
+#include <functional>
+#include <memory>
+#include <mutex>
+#include <string_view>
 #include <typeinfo>
+#include <unordered_set>
 
 #include "kernite/Assert.h"
 #include "orbit/Any.h"
@@ -19,14 +25,6 @@ bool Comparable(const Any* a, const Any* b, bool exact) {
 
 }  // namespace
 
-unsigned int GetPrimitiveExtraSize(const std::string& value) {
-    // A short string keeps its text inside the object and owns no heap block.
-    const auto object = reinterpret_cast<std::uintptr_t>(&value);
-    const auto text = reinterpret_cast<std::uintptr_t>(value.data());
-    if (text >= object && text < object + sizeof(std::string)) return 0;
-    return static_cast<unsigned int>(value.capacity() + 1);
-}
-
 unsigned int GetPrimitiveExtraSize(const MethodName& value) { return GetPrimitiveExtraSize(value.GetName()); }
 
 unsigned int GetExtraSize(const std::vector<std::string>& items, SizeFunction f) {
@@ -36,11 +34,50 @@ unsigned int GetExtraSize(const std::vector<std::string>& items, SizeFunction f)
     return size;
 }
 
+// Type names of managed object references: a fixed open-addressed table read without
+// a lock, slots filled once by compare-and-swap and never emptied; names beyond it
+// (a process would need thousands of managed types) go to a locked set. The names
+// are never freed: every reference may point to them for the life of the process.
+namespace {
+
+constexpr std::size_t kTypeNameSlots = 4096;  // a power of two
+constexpr std::size_t kTypeNameProbes = 32;
+std::atomic<const std::string*> gTypeNames[kTypeNameSlots];
+
+struct MoreTypeNames {
+    std::mutex mutex;
+    std::unordered_set<std::string> names;  // nodes do not move
+};
+
+const std::string* InternBeyondTable(std::string_view type) {
+    static auto* more = new MoreTypeNames();
+    std::lock_guard<std::mutex> lock(more->mutex);
+    return &*more->names.emplace(type).first;
+}
+
+}  // namespace
+
+const std::string* MoRef::InternTypeName(std::string_view type) {
+    const std::size_t hash = std::hash<std::string_view>{}(type);
+    for (std::size_t probe = 0; probe < kTypeNameProbes; ++probe) {
+        std::atomic<const std::string*>& slot = gTypeNames[(hash + probe) & (kTypeNameSlots - 1)];
+        const std::string* held = slot.load(std::memory_order_acquire);
+        if (held == nullptr) {
+            auto made = std::make_unique<std::string>(type);
+            if (slot.compare_exchange_strong(held, made.get(), std::memory_order_acq_rel, std::memory_order_acquire))
+                return made.release();
+            // Another thread filled the slot first; `held` is its name.
+        }
+        if (*held == type) return held;
+    }
+    return InternBeyondTable(type);
+}
+
 Type* MoRef::_GetType() const { return Orbit::GetType<MoRef>(); }
 
+// The type name is shared, not held: only the id counts.
 unsigned int MoRef::_GetSize(SizeFunction f) const {
     unsigned int size = f(sizeof(MoRef));
-    if (unsigned int extra = GetPrimitiveExtraSize(_type)) size += f(extra);
     if (unsigned int extra = GetPrimitiveExtraSize(_id)) size += f(extra);
     return size;
 }
@@ -57,7 +94,7 @@ void MoRef::_DiffProperties(Any* other, const std::string& path, PropertyDiffSet
     if (!_IsEqual(other)) diffs.Add(path);
 }
 
-std::string MoRef::ToString() const { return _type + ":" + _id; }
+std::string MoRef::ToString() const { return *_type + ":" + _id; }
 
 bool DataArrayBase::_IsEqual(Any* other, bool exact) const {
     if (other == nullptr) Kernite::PanicAssert("obj", "orbit/array", __LINE__);
@@ -102,7 +139,11 @@ void DataArrayBase::_DiffProperties(Any* other, const std::string& path, Propert
 
 DataObjectArrayBase::DataObjectArrayBase(const DataObjectArrayBase& other) : DataArrayBase() {
     _vec.reserve(other._vec.size());
-    for (const auto& item : other._vec) _vec.emplace_back(item ? item->_Clone() : nullptr);
+    for (const auto& item : other._vec) {
+        Any* clone = item ? item->_Clone() : nullptr;
+        if (clone) clone->IncRefNew();
+        _vec.push_back(Kernite::Ref<Any>::Adopt(clone));  // room was reserved: cannot throw
+    }
 }
 
 void DataObjectArrayBase::RemoveAt(int index) {

@@ -134,9 +134,9 @@ Any* Shape::_Clone() const { return new Shape(*this); }
 
 unsigned int Shape::_GetSize(Orbit::SizeFunction f) const {
     unsigned int size = DynamicData::_GetSize(f) - f(sizeof(DynamicData)) + f(sizeof(Shape));
-    size += f(static_cast<unsigned int>(_label.capacity()));
+    size += f(Orbit::GetPrimitiveExtraSize(_label));
     if (_note.IsSet())
-        size += f(sizeof(std::string)) + f(static_cast<unsigned int>(_note.GetValue().capacity()));
+        size += f(sizeof(std::string)) + f(Orbit::GetPrimitiveExtraSize(_note.GetValue()));
     if (_next) size += _next->_GetSize(f);
     if (_extra) size += _extra->_GetSize(f);
     if (_owner) size += _owner->_GetSize(f);

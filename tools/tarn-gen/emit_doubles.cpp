@@ -76,7 +76,7 @@ std::string EmitDoubles(const Model&, const Unit& unit) {
         out.Print("\nnamespace {\n\n"
                   "void Start$flat$(Orbit::ManagedObject* target, int index, Kernite::RefVector<Orbit::Any>& args,\n"
                   "    const Orbit::CompletionCallback& callback, Kernite::Ref<Kernite::System::ScheduledItem>& item) {\n"
-                  "    $cls$Stub* stub = Kernite::NarrowToType<$cls$Stub, Orbit::ManagedObject>(target);\n",
+                  "    $cls$Stub* stub = Orbit::NarrowTarget<$cls$Stub, Orbit::ManagedObject>(target);\n",
                   vars);
         if (members.empty()) {
             out.Raw("    (void)stub;\n    (void)index;\n    (void)args;\n    (void)callback;\n    (void)item;\n}\n\n");

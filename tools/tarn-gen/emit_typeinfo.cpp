@@ -207,12 +207,12 @@ private:
             }
             if (cases.empty()) {
                 // Still narrows: an object of another class is refused.
-                _out.Print("        Kernite::NarrowToType<T, Orbit::DataObject>(object);\n"
+                _out.Print("        Orbit::NarrowTarget<T, Orbit::DataObject>(object);\n"
                            "        (void)index;\n$unusedValue$",
                            {{"unusedValue", std::string(fn.signature).find("value") != std::string::npos ? "        (void)value;\n" : ""}});
                 if (*fn.fallback) _out.Print("        $fallback$\n", {{"fallback", fn.fallback}});
             } else {
-                _out.Raw("        T* self = Kernite::NarrowToType<T, Orbit::DataObject>(object);\n        switch (index) {\n");
+                _out.Raw("        T* self = Orbit::NarrowTarget<T, Orbit::DataObject>(object);\n        switch (index) {\n");
                 bool returns = *fn.fallback != 0;
                 for (const auto& [index, body] : cases) {
                     if (returns) _out.Print("        case $i$: {\n            $body$\n        }\n", {{"i", std::to_string(index)}, {"body", body}});
@@ -308,7 +308,7 @@ private:
         _out.Print("\nvoid Invoke$flat$(Orbit::ManagedObject* target, int index, Kernite::RefVector<Orbit::Any>& args,\n"
                    "    Kernite::Ref<Orbit::Any>& result) {\n"
                    "    result = nullptr;\n"
-                   "    $cls$* self = Kernite::NarrowToType<$cls$, Orbit::ManagedObject>(target);\n",
+                   "    $cls$* self = Orbit::NarrowTarget<$cls$, Orbit::ManagedObject>(target);\n",
                    {{"flat", t.flatName}, {"cls", t.className}});
         std::vector<Member> members = MembersOf(t);
         if (members.empty()) {

@@ -21,7 +21,7 @@ public:
                   {{"get", getter}, {"set", setter}, {"m", member}});
     }
     std::string SizeTerm() const override { return "size += f(Orbit::GetPrimitiveExtraSize(" + member + "));"; }
-    std::string Get() const override { return "*static_cast<std::string*>(value) = self->" + member + ";"; }
+    std::string Get() const override { return "Orbit::WriteValue<std::string>(value) = self->" + member + ";"; }
     std::string Set() const override { return "self->" + member + " = Orbit::ReadValue<std::string>(value);"; }
 };
 
@@ -39,8 +39,8 @@ public:
     }
     std::string SizeTerm() const override { return ""; }
     std::string Get() const override {
-        if (property.type.IsEnum()) return "*static_cast<int*>(value) = static_cast<int>(self->" + member + ");";
-        return "*static_cast<" + MemberType() + "*>(value) = self->" + member + ";";
+        if (property.type.IsEnum()) return "Orbit::WriteValue<int>(value) = static_cast<int>(self->" + member + ");";
+        return "Orbit::WriteValue<" + MemberType() + ">(value) = self->" + member + ";";
     }
     std::string Set() const override {
         if (property.type.IsEnum())
@@ -67,8 +67,8 @@ public:
                ".GetValue()));";
     }
     std::string Get() const override {
-        if (property.type.IsEnum()) return "*static_cast<int*>(value) = static_cast<int>(self->" + member + ".GetValue());";
-        return "*static_cast<" + ValueType(property) + "*>(value) = self->" + member + ".GetValue();";
+        if (property.type.IsEnum()) return "Orbit::WriteValue<int>(value) = static_cast<int>(self->" + member + ".GetValue());";
+        return "Orbit::WriteValue<" + ValueType(property) + ">(value) = self->" + member + ".GetValue();";
     }
     std::string Set() const override {
         if (property.type.IsEnum())
@@ -101,7 +101,7 @@ public:
                   {{"cls", cls}, {"set", setter}, {"type", ValueType(property)}, {"m", member}});
     }
     std::string SizeTerm() const override { return "if (" + member + ") size += " + member + "->_GetSize(f);"; }
-    std::string Get() const override { return "*static_cast<Kernite::Ref<Orbit::Any>*>(value) = self->" + member + ".Get();"; }
+    std::string Get() const override { return "Orbit::WriteValue<Kernite::Ref<Orbit::Any>>(value) = self->" + member + ".Get();"; }
     std::string Set() const override {
         return "self->" + setter + "(Kernite::NarrowToType<" + ValueType(property) + ", Orbit::Any>(Orbit::ReadObject(value)));";
     }
@@ -128,7 +128,7 @@ public:
                   {{"array", Array()}, {"cls", cls}, {"get", getter}, {"set", setter}, {"m", member}});
     }
     std::string SizeTerm() const override { return "if (auto* array = " + member + ".Peek()) size += array->_GetSize(f);"; }
-    std::string Get() const override { return "*static_cast<Kernite::Ref<Orbit::Any>*>(value) = self->" + member + ".Get();"; }
+    std::string Get() const override { return "Orbit::WriteValue<Kernite::Ref<Orbit::Any>>(value) = self->" + member + ".Get();"; }
     std::string Set() const override {
         return "self->" + member + ".Set(Kernite::NarrowToType<" + Array() + ", Orbit::Any>(Orbit::ReadObject(value)));";
     }

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <string>
+#include <type_traits>
 #include <typeinfo>
 
 #include "kernite/Exception.h"
@@ -15,6 +16,11 @@ namespace Kernite {
 template <class T, class U>
 T* NarrowToType(U* p) {
     if (p == nullptr) return nullptr;
+    if constexpr (!std::is_abstract_v<T> && requires { static_cast<T*>(p); }) {
+        // Most objects are narrowed to exactly their own class, which needs no walk
+        // of the class hierarchy.
+        if (typeid(*p) == typeid(T)) return static_cast<T*>(p);
+    }
     if (T* t = dynamic_cast<T*>(p)) return t;
     ThrowTypeMismatch(typeid(const T*).name(), typeid(const U*).name());
 }

@@ -25,8 +25,29 @@ protected:
 
 class ObjectImpl : public virtual Object {
 public:
-    void IncRef() const override;
-    void DecRef() const override;
+    // Final and inline: wherever the class is known to be built on ObjectImpl the
+    // count is changed in place, without a virtual call; the hooks below are where a
+    // class adds its own behaviour.
+    void IncRef() const final {
+        if (_refCount.fetch_add(1, std::memory_order_relaxed) == 0)
+            const_cast<ObjectImpl*>(this)->FirstIncRef(typeid(*this));
+    }
+    void DecRef() const final {
+        // Whoever holds the only reference is the only one who may still reach the
+        // object, so the last release needs no read-modify-write.
+        if (_refCount.load(std::memory_order_acquire) == 1) return Destroy();
+        const int previous = _refCount.fetch_sub(1, std::memory_order_acq_rel);
+        if (previous == 1) Destroy();
+        else if (previous <= 0) ReleasedTooOften();
+    }
+    // Takes the first reference of an object that only its maker can reach yet, such
+    // as a clone just made, without a read-modify-write. An object that already has
+    // references (an immutable value may be its own clone) takes a plain IncRef.
+    void IncRefNew() const {
+        if (_refCount.load(std::memory_order_relaxed) != 0) return IncRef();
+        _refCount.store(1, std::memory_order_relaxed);
+        const_cast<ObjectImpl*>(this)->FirstIncRef(typeid(*this));
+    }
     std::string ToString() const override;
     int GetRefCount() const override;
 
@@ -47,6 +68,10 @@ protected:
     virtual void FinalDecRef(const std::type_info& type);
 
 private:
+    // Runs the last-release hook and deletes the object.
+    void Destroy() const;
+    [[noreturn]] static void ReleasedTooOften();
+
     mutable std::atomic<int> _refCount{0};
 };
 

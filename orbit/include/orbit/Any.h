@@ -2,7 +2,9 @@
 // copy, measure and compare.
 #pragma once
 
+#include <cstdint>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "kernite/Object.h"
@@ -53,13 +55,15 @@ private:
     std::string _name;
 };
 
-// A reference to a managed object: its type's wire name and its id.
+// A reference to a managed object: its type's wire name and its id. The type name
+// is kept once per process and shared by every reference of that type, so copying
+// a reference copies only its id.
 class MoRef : public Any {
 public:
-    MoRef(std::string type, std::string id) : _type(std::move(type)), _id(std::move(id)) {}
+    MoRef(std::string_view type, std::string id) : _type(InternTypeName(type)), _id(std::move(id)) {}
     MoRef(const MoRef&) = default;
 
-    const std::string& GetType() const noexcept { return _type; }
+    const std::string& GetType() const noexcept { return *_type; }
     const std::string& GetId() const noexcept { return _id; }
 
     Type* _GetType() const override;
@@ -69,10 +73,14 @@ public:
     void _DiffProperties(Any* other, const std::string& path, PropertyDiffSet& diffs) const override;
     std::string ToString() const override;
 
+    // Equal type names are one and the same string.
     friend bool operator==(const MoRef& a, const MoRef& b) { return a._type == b._type && a._id == b._id; }
 
 private:
-    std::string _type;
+    // The process's one copy of `type`, made on first use and never freed.
+    static const std::string* InternTypeName(std::string_view type);
+
+    const std::string* _type;
     std::string _id;
 };
 
@@ -87,7 +95,12 @@ public:
 
 // The heap memory a string holds beyond its own object: zero while its text fits
 // inside the object.
-unsigned int GetPrimitiveExtraSize(const std::string& value);
+inline unsigned int GetPrimitiveExtraSize(const std::string& value) {
+    const auto object = reinterpret_cast<std::uintptr_t>(&value);
+    const auto text = reinterpret_cast<std::uintptr_t>(value.data());
+    if (text >= object && text < object + sizeof(std::string)) return 0;
+    return static_cast<unsigned int>(value.capacity() + 1);
+}
 unsigned int GetPrimitiveExtraSize(const MethodName& value);
 // The item storage of a string vector plus each string's heap memory, mapped by f.
 unsigned int GetExtraSize(const std::vector<std::string>& items, SizeFunction f);

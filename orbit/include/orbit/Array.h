@@ -93,6 +93,12 @@ public:
     void Reserve(int capacity);
     unsigned int _GetSize(SizeFunction f) const override;
 
+    // The runtime's entry points: it holds arrays made by a record's createArray()
+    // without knowing their item class, so the check against it is virtual.
+    virtual void CheckedSetAt(int index, Any* item) = 0;
+    virtual void CheckedAppend(Any* item) = 0;
+    virtual void CheckedInsertAt(int index, Any* item) = 0;
+
 protected:
     // Unchecked as to class: the typed entry points of DataArray<T> check first.
     void SetAtInt(int index, Any* item);
@@ -124,14 +130,14 @@ public:
     void SetAt(int index, T* item) { SetAtInt(index, item); }
     void InsertAt(int index, T* item) { InsertAtInt(index, item); }
 
-    // The runtime's entry points: a non-null item must be a T.
-    void CheckedSetAt(int index, Any* item) {
+    // A non-null item must be a T.
+    void CheckedSetAt(int index, Any* item) override {
         if (!(0 <= index && index < (int)_vec.size()))
             Kernite::PanicAssert("0 <= index && index < (int)_vec.size()", "orbit/array", __LINE__);
         SetAtInt(index, Checked(item));
     }
-    void CheckedAppend(Any* item) { AppendInt(Checked(item)); }
-    void CheckedInsertAt(int index, Any* item) {
+    void CheckedAppend(Any* item) override { AppendInt(Checked(item)); }
+    void CheckedInsertAt(int index, Any* item) override {
         if (!(0 <= index && index <= (int)_vec.size()))
             Kernite::PanicAssert("0 <= index && index <= (int)_vec.size()", "orbit/array", __LINE__);
         InsertAtInt(index, Checked(item));
@@ -170,7 +176,7 @@ public:
     ArrayField(const ArrayField& other) {
         if (A* source = other.Peek()) {
             A* copy = static_cast<A*>(source->_Clone());
-            copy->IncRef();
+            copy->IncRefNew();
             _array.store(copy, std::memory_order_relaxed);
         }
     }

@@ -66,6 +66,23 @@ const T& ReadValue(const void* value) {
     return *static_cast<const T*>(value);
 }
 
+// Record functions: the caller's storage that receives a property; null is refused
+// rather than written through.
+template <class T>
+T& WriteValue(void* value) {
+    if (value == nullptr) throw Kernite::InvalidArgumentException(std::string("null"));
+    return *static_cast<T*>(value);
+}
+
+// Record functions and dispatch: the object acted on, narrowed to its class. There
+// is nothing to act on in null, so it is refused like a missing value.
+template <class T, class U>
+T* NarrowTarget(U* object) {
+    T* self = Kernite::NarrowToType<T, U>(object);
+    if (self == nullptr) throw Kernite::InvalidArgumentException(std::string("null"));
+    return self;
+}
+
 // Record functions: an enumeration's value, which must name one of its `count` tags.
 inline int ReadEnum(const void* value, int count) {
     int v = ReadValue<int>(value);
@@ -80,7 +97,9 @@ inline Any* ReadObject(const void* value) { return static_cast<Any*>(const_cast<
 template <class T>
 Kernite::Ref<T> CloneOf(const Kernite::Ref<T>& source) {
     if (!source) return nullptr;
-    return Kernite::Ref<T>(static_cast<T*>(source->_Clone()));
+    T* clone = static_cast<T*>(source->_Clone());
+    clone->IncRefNew();
+    return Kernite::Ref<T>::Adopt(clone);
 }
 
 }  // namespace Orbit

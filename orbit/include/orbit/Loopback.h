@@ -5,6 +5,7 @@
 #include <condition_variable>
 #include <deque>
 #include <functional>
+#include <memory>
 #include <mutex>
 #include <string>
 #include <thread>
@@ -38,24 +39,34 @@ public:
                      const CompletionCallback& callback, Kernite::Ref<Kernite::System::ScheduledItem>& item,
                      RequestContext* context) override;
 
-    // Finishes the queued calls and joins the worker. Idempotent.
+    // Finishes the queued calls and joins the worker. Idempotent. Called on the
+    // worker's own thread (from a completion callback, or by the release of the last
+    // reference there), it runs what is still queued itself and lets the worker end.
     void Shutdown();
 
     // The context of the call being served on this thread, or null.
     static RequestContext* CurrentContext();
 
 private:
+    // The worker's queue, shared with the worker thread, which may outlive the
+    // adapter when the adapter was released on that thread.
+    struct WorkQueue {
+        std::mutex mutex;
+        std::condition_variable ready;
+        std::deque<std::function<void()>> calls;
+        bool stopping = false;
+        // Null once none is left; the lock is not held while the call runs.
+        std::function<void()> Next(bool wait);
+    };
+
     Kernite::Ref<ManagedObject> Find(const std::string& id) const;
-    void WorkerLoop();
+    static void WorkerLoop(std::shared_ptr<WorkQueue> queue);
 
     mutable std::mutex _objectsMutex;
     std::unordered_map<std::string, Kernite::Ref<ManagedObject>> _objects;
 
-    std::mutex _queueMutex;
-    std::condition_variable _queueReady;
-    std::deque<std::function<void()>> _queue;
-    bool _stopping = false;
-    std::thread _worker;
+    const std::shared_ptr<WorkQueue> _queue = std::make_shared<WorkQueue>();
+    std::thread _worker;  // guarded by _queue->mutex
 };
 
 }  // namespace Orbit

@@ -1,4 +1,4 @@
-// Assertion helpers shared by the runtime's tests.
+// Assertion helpers shared by the test suites.
 #pragma once
 
 #include <gtest/gtest.h>

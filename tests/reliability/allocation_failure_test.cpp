@@ -1,0 +1,268 @@
+// Allocation failure at every allocation of copying, cloning, converting, calling
+// and throwing: whichever allocation fails, std::bad_alloc comes out, nothing
+// leaks (the live-object count returns to what it was) and the source is
+// unchanged.
+#include <gtest/gtest.h>
+
+#include <cstdio>
+#include <memory>
+#include <new>
+#include <stdexcept>
+
+#include "failing_allocator.h"
+#include "orbit/Loopback.h"
+#include "tarn/types.h"
+#include "values.h"
+
+namespace {
+
+using Kernite::Ref;
+using Reliability::ArmAllocator;
+using Reliability::DisarmAllocator;
+
+long LiveObjects() { return Kernite::ObjectImpl::LiveObjects(); }
+
+// Disarms on the way out, whatever leaves the operation.
+struct Armed {
+    explicit Armed(long failAt) { ArmAllocator(failAt); }
+    ~Armed() { DisarmAllocator(); }
+    Armed(const Armed&) = delete;
+    Armed& operator=(const Armed&) = delete;
+};
+
+// Runs `op` once to fill first-use caches, counts its allocations on a second run,
+// then fails each of them in turn. After every failure (allocator disarmed) the
+// live-object count must be back and `unchanged()` must hold. Returns the number
+// of failure points.
+template <class Op, class Unchanged>
+long FailEveryAllocation(const char* what, Op op, Unchanged unchanged) {
+    op();
+    long total = 0;
+    {
+        Armed counting(0);
+        op();
+        total = DisarmAllocator();
+    }
+    EXPECT_GT(total, 0) << what;
+    for (long k = 1; k <= total; ++k) {
+        const long live = LiveObjects();
+        bool threw = false;
+        try {
+            Armed failing(k);
+            op();
+        } catch (const std::bad_alloc&) {
+            threw = true;
+        }
+        EXPECT_TRUE(threw) << what << ": allocation " << k << " of " << total << " failed and nothing was thrown";
+        EXPECT_EQ(LiveObjects(), live) << what << ": objects leaked when allocation " << k << " failed";
+        EXPECT_TRUE(unchanged()) << what << ": source changed when allocation " << k << " failed";
+        if (::testing::Test::HasFailure()) return k;
+    }
+    std::printf("%s: %ld failure points\n", what, total);
+    return total;
+}
+
+Orbit::DataObjectType* DataType(Orbit::Type* type) { return Kernite::NarrowToType<Orbit::DataObjectType, Orbit::Type>(type); }
+
+// A fully populated object of T: every property of its chain set, nested objects
+// three levels deep, arrays of two items (so a VmState carries a snapshot tree).
+template <class T>
+Ref<T> Populated(std::uint32_t seed) {
+    Ref<Orbit::DataObject> object = Reliability::MakePopulated(DataType(Orbit::GetType<T>()), seed, 3, 2);
+    return Ref<T>(Kernite::NarrowToType<T, Orbit::DataObject>(object.Get()));
+}
+
+template <class T>
+Ref<T> CopyOf(const Ref<T>& source) {
+    return Ref<T>(new T(*source));
+}
+
+bool Same(Orbit::Any* a, Orbit::Any* b) { return a->_IsEqual(b, true); }
+
+template <class T>
+long CopyAndClone(const char* name, std::uint32_t seed) {
+    Ref<T> source = Populated<T>(seed);
+    Ref<T> before = CopyOf(source);
+    EXPECT_TRUE(Same(before.Get(), source.Get())) << name;
+    const std::string copying = std::string("copy constructor of ") + name;
+    const std::string cloning = std::string("_Clone of ") + name;
+    long points = FailEveryAllocation(
+        copying.c_str(), [&] { Ref<T> copy(new T(*source)); },
+        [&] { return Same(source.Get(), before.Get()); });
+    points += FailEveryAllocation(
+        cloning.c_str(), [&] { Ref<Orbit::Any> clone(source->_Clone()); },
+        [&] { return Same(source.Get(), before.Get()); });
+    return points;
+}
+
+TEST(AllocationFailure, CopiesAndClonesOfPopulatedObjects) {
+    long points = 0;
+    points += CopyAndClone<Tarn::Vmprov::VmState>("VmState", 11);
+    points += CopyAndClone<Tarn::Vmprov::HostState>("HostState", 12);
+    points += CopyAndClone<Tarn::Vmprov::CloneContext>("CloneContext", 13);
+    points += CopyAndClone<Tarn::Ft::FtVmInfo>("FtVmInfo", 14);
+    std::printf("copies and clones: %ld failure points in all\n", points);
+
+    // The snapshot tree really is a tree: the copies above walked nested arrays.
+    Ref<Tarn::Vmprov::VmState> vm = Populated<Tarn::Vmprov::VmState>(11);
+    ASSERT_EQ(vm->GetRootSnapshot()->GetLength(), 2);
+    int nested = 0;
+    for (int i = 0; i < 2; ++i)
+        if (auto* snapshot = vm->GetRootSnapshot()->GetAt(i)) nested += snapshot->GetChildSnapshot()->GetLength();
+    EXPECT_GT(nested, 0);
+}
+
+TEST(AllocationFailure, EnumerationConversions) {
+    using Mode = Tarn::LockStresser::LockMode;
+    auto* type = Kernite::NarrowToType<Orbit::EnumType, Orbit::Type>(Orbit::GetType<Mode>());
+    Ref<Orbit::Array<std::string>> tags(new Orbit::Array<std::string>({"x", "sall", "s", "xall", "x", "s"}));
+    Ref<Orbit::Array<Mode>> values(new Orbit::Array<Mode>({Mode::sall, Mode::x, Mode::xall, Mode::s, Mode::s}));
+    Ref<Orbit::Any> tagsBefore(tags->_Clone());
+    Ref<Orbit::Any> valuesBefore(values->_Clone());
+
+    // `out` keeps what it held when the conversion fails.
+    Ref<Orbit::Any> enumOut(new Orbit::Array<Mode>({Mode::x}));
+    Orbit::Any* enumSentinel = enumOut.Get();
+    Ref<Orbit::Array<std::string>> stringOut(new Orbit::Array<std::string>({"kept"}));
+    Orbit::Array<std::string>* stringSentinel = stringOut.Get();
+
+    long points = FailEveryAllocation(
+        "StringArrayToEnumArray",
+        [&] {
+            Ref<Orbit::Any> out = enumOut;
+            type->StringArrayToEnumArray(tags.Get(), enumOut);
+            enumOut = out;  // back to the sentinel for the next round
+        },
+        [&] { return enumOut.Get() == enumSentinel && Same(tags.Get(), tagsBefore.Get()); });
+    points += FailEveryAllocation(
+        "EnumArrayToStringArray",
+        [&] {
+            Ref<Orbit::Array<std::string>> out = stringOut;
+            type->EnumArrayToStringArray(values.Get(), stringOut);
+            stringOut = out;
+        },
+        [&] { return stringOut.Get() == stringSentinel && Same(values.Get(), valuesBefore.Get()); });
+    std::printf("enumeration conversions: %ld failure points in all\n", points);
+
+    // The last, unfailed round converted for real.
+    Ref<Orbit::Any> out;
+    type->StringArrayToEnumArray(tags.Get(), out);
+    EXPECT_TRUE(Same(out.Get(), Ref<Orbit::Any>(new Orbit::Array<Mode>({Mode::x, Mode::sall, Mode::s, Mode::xall,
+                                                                          Mode::x, Mode::s})).Get()));
+}
+
+// A small server-side implementation: it answers with new objects, so that results
+// allocate too.
+class Factory : public Orbit::ManagedObjectImpl, public virtual Tarn::Vmprov::ActionFactory {
+public:
+    Factory() : Orbit::ManagedObjectImpl("factory-1") {}
+
+    void CreateAction(const std::string& actionType, Tarn::Vmprov::Action::Input* input,
+                      Ref<Orbit::MoRef>& result) override {
+        result = new Orbit::MoRef("tarn.vmprov.Action", actionType + (input ? "/configured" : "/bare"));
+    }
+    void DestroyAction(Orbit::MoRef*) override {}
+    void CreateDefaultActionInput(Orbit::MoRef*, Ref<Tarn::Vmprov::Action::Input>& result) override {
+        result = new Tarn::Vmprov::Action::Input();
+    }
+    void CreateMigrateActionInput(Orbit::MoRef* vm, Cairn::Vm::RelocateSpec*, Cairn::VirtualMachine::MovePriority,
+                                  bool, Ref<Tarn::Vmprov::Action::Input>& result) override {
+        Ref<Tarn::Vmprov::VmContext> context(new Tarn::Vmprov::VmContext());
+        Ref<Tarn::Vmprov::VmState> state(new Tarn::Vmprov::VmState());
+        state->SetVm(vm);
+        state->SetVmPathName("[datastore-with-a-long-name] vm/vm.cfg");
+        context->SetSrcVmState(state.Get());
+        result = new Tarn::Vmprov::Action::Input(context.Get(), nullptr);
+    }
+};
+
+TEST(AllocationFailure, StubCallsThroughTheLoopbackAdapter) {
+    Ref<Orbit::LoopbackAdapter> adapter(new Orbit::LoopbackAdapter());
+    adapter->Register("factory-1", Ref<Factory>(new Factory()).Get());
+    Ref<Tarn::Vmprov::ActionFactoryStub> stub(new Tarn::Vmprov::ActionFactoryStub("factory-1", adapter.Get(), nullptr));
+
+    Ref<Tarn::Vmprov::Action::Input> input = Populated<Tarn::Vmprov::Action::Input>(21);
+    Ref<Tarn::Vmprov::Action::Input> inputBefore = CopyOf(input);
+    Ref<Orbit::MoRef> vm(new Orbit::MoRef("cairn.VirtualMachine", "vm-with-a-long-identifier-42"));
+    Ref<Orbit::MoRef> vmBefore(new Orbit::MoRef(*vm));
+    Ref<Cairn::Vm::RelocateSpec> spec(new Cairn::Vm::RelocateSpec());
+    const std::string actionType = "tarn.vmprov.CreateSnapshot-with-a-long-name";
+
+    // A result parameter keeps what it held unless the call completed.
+    Ref<Orbit::MoRef> actionSentinel(new Orbit::MoRef("tarn.vmprov.Action", "sentinel"));
+    Ref<Orbit::MoRef> action = actionSentinel;
+    Ref<Tarn::Vmprov::Action::Input> inputSentinel(new Tarn::Vmprov::Action::Input());
+    Ref<Tarn::Vmprov::Action::Input> made = inputSentinel;
+
+    long points = FailEveryAllocation(
+        "CreateAction",
+        [&] {
+            stub->CreateAction(actionType, input.Get(), action);
+            action = actionSentinel;
+        },
+        [&] { return action == actionSentinel && Same(input.Get(), inputBefore.Get()); });
+    points += FailEveryAllocation(
+        "CreateMigrateActionInput",
+        [&] {
+            stub->CreateMigrateActionInput(vm.Get(), spec.Get(), Cairn::VirtualMachine::MovePriority::highPriority, true,
+                                           made);
+            made = inputSentinel;
+        },
+        [&] { return made == inputSentinel && Same(vm.Get(), vmBefore.Get()); });
+    points += FailEveryAllocation(
+        "DestroyAction", [&] { stub->DestroyAction(vm.Get()); }, [&] { return Same(vm.Get(), vmBefore.Get()); });
+    std::printf("stub calls: %ld failure points in all\n", points);
+
+    // Unfailed, the calls deliver what the implementation answered.
+    stub->CreateAction(actionType, input.Get(), action);
+    EXPECT_EQ(action->GetId(), actionType + "/configured");
+    stub->CreateMigrateActionInput(vm.Get(), spec.Get(), Cairn::VirtualMachine::MovePriority::highPriority, true, made);
+    auto* context = Kernite::NarrowToType<Tarn::Vmprov::VmContext, Orbit::DataObject>(made->GetContext());
+    ASSERT_NE(context, nullptr);
+    EXPECT_TRUE(Same(context->GetSrcVmState()->GetVm(), vm.Get()));
+    adapter->Shutdown();
+}
+
+TEST(AllocationFailure, FaultExceptions) {
+    using Fault = Tarn::Fault::SecurityConfigFault;
+    Ref<Fault> fault = Populated<Fault>(31);
+    Ref<Fault> faultBefore = CopyOf(fault);
+    const int references = fault->GetRefCount();
+    std::unique_ptr<Fault::Exception> stored(fault->CreateException());
+    const std::string message = stored->what();
+    EXPECT_EQ(message, "tarn.fault.SecurityConfigFault");
+    auto unchanged = [&] {
+        return Same(fault.Get(), faultBefore.Get()) && fault->GetRefCount() == references + 1 &&
+               stored->GetFault() == fault.Get() && message == stored->what();
+    };
+
+    long points = FailEveryAllocation(
+        "SecurityConfigFault::Throw",
+        [&] {
+            try {
+                fault->Throw();
+            } catch (const Fault::Exception& e) {
+                if (e.GetFault() != fault.Get()) throw std::logic_error("the exception reports another fault");
+            }
+        },
+        unchanged);
+    points += FailEveryAllocation(
+        "SecurityConfigFault::CreateException",
+        [&] { std::unique_ptr<Fault::Exception> e(fault->CreateException()); }, unchanged);
+    points += FailEveryAllocation(
+        "SecurityConfigFault::Exception::Clone", [&] { std::unique_ptr<Fault::Exception> e(stored->Clone()); },
+        unchanged);
+    points += FailEveryAllocation(
+        "SecurityConfigFault::Exception::Throw",
+        [&] {
+            try {
+                stored->Throw();
+            } catch (const Fault::Exception& e) {
+                if (e.GetFault() != fault.Get()) throw std::logic_error("the exception reports another fault");
+            }
+        },
+        unchanged);
+    std::printf("fault exceptions: %ld failure points in all\n", points);
+}
+
+}  // namespace

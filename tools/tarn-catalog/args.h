@@ -1,0 +1,29 @@
+// The command line of tarn-catalog.
+#pragma once
+
+#include <optional>
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+namespace tarncatalog {
+
+enum class Command { List, Show, Versions, Dump, Help };
+
+struct Options {
+    Command command = Command::List;
+    std::string typeName;               // show
+    std::optional<std::string> version;  // --version
+};
+
+// A command line that does not parse; the message says what is wrong.
+class UsageError : public std::runtime_error {
+public:
+    using std::runtime_error::runtime_error;
+};
+
+Options ParseArgs(const std::vector<std::string>& args);
+
+const char* HelpText();
+
+}  // namespace tarncatalog

@@ -1,0 +1,165 @@
+#include "catalog.h"
+
+#include <algorithm>
+#include <cctype>
+
+#include "orbit/Orbit.h"
+
+namespace tarncatalog {
+namespace {
+
+constexpr const char* kTarnPrefix = "tarn.";
+
+// The same rule as Type::IsVisible, for members: a version sees what it
+// introduced and what the versions it includes introduced.
+bool Sees(Orbit::Version* seenBy, Orbit::Version* introducedIn) {
+    if (seenBy == nullptr) return true;
+    return introducedIn != nullptr && (seenBy == introducedIn || seenBy->Includes(introducedIn));
+}
+
+bool Sees(Orbit::Version* seenBy, const std::string& versionName) {
+    return seenBy == nullptr || Sees(seenBy, FindVersion(versionName));
+}
+
+std::optional<std::string> Text(const char* s) {
+    if (s == nullptr) return std::nullopt;
+    return std::string(s);
+}
+
+std::optional<std::string> FlatName(const Orbit::TypeInfo* record) {
+    if (record == nullptr) return std::nullopt;
+    return Text(record->flatName);
+}
+
+MemberEntry ReadMember(const Orbit::Member& m, const char* privilege) {
+    MemberEntry e;
+    e.name = m.name;
+    e.privilege = Text(privilege);
+    e.type = FlatName(m.typeRecord);
+    e.flags = m.flags;
+    e.version = m.version;
+    return e;
+}
+
+// The base as the type object resolves it; the record's base header while the
+// runtime has not made that type.
+std::optional<std::string> BaseName(Orbit::Type* base, const Orbit::TypeInfo* record) {
+    if (base != nullptr) return base->GetWsdlName();
+    return FlatName(record);
+}
+
+std::string VersionName(Orbit::Type* type) {
+    if (Orbit::Version* v = type->GetVersion()) return v->GetName();
+    if (auto* impl = dynamic_cast<Orbit::TypeImpl*>(type); impl && impl->GetVersionName())
+        return impl->GetVersionName();
+    return {};
+}
+
+void ReadData(Orbit::DataObjectType* type, Orbit::Version* seenBy, TypeEntry& out) {
+    out.base = BaseName(type->GetBaseType(), type->GetDataTypeInfo()->base);
+    const auto& properties = type->GetProperties();
+    for (std::size_t i = 0; i < properties.size(); ++i) {
+        if (!Sees(seenBy, properties[i].version)) {
+            ++out.hiddenMembers;
+            continue;
+        }
+        MemberEntry e = ReadMember(properties[i], properties[i].privilege);
+        e.memberNumber = static_cast<int>(i);
+        out.properties.push_back(std::move(e));
+    }
+}
+
+void ReadManaged(Orbit::ManagedObjectType* type, Orbit::Version* seenBy, TypeEntry& out) {
+    out.base = BaseName(type->GetBaseType(), type->GetManagedTypeInfo()->base);
+    for (const auto& member : type->GetMembers()) {
+        if (!Sees(seenBy, member->GetVersionName())) {
+            ++out.hiddenMembers;
+            continue;
+        }
+        if (member->IsPropertyGetter()) {
+            // A getter's result is the property as its record describes it.
+            MemberEntry e = ReadMember(member->GetResult(), member->GetPrivilege());
+            e.name = member->GetName();
+            e.memberNumber = member->GetMemberNumber();
+            out.properties.push_back(std::move(e));
+            continue;
+        }
+        MethodEntry m;
+        m.name = member->GetName();
+        m.wsdlName = member->GetWsdlName();
+        m.privilege = Text(member->GetPrivilege());
+        m.version = member->GetVersionName();
+        m.task = member->IsTask();
+        m.memberNumber = member->GetMemberNumber();
+        m.result = ReadMember(member->GetResult(), nullptr);
+        for (const Orbit::Member& p : member->GetParameters()) m.params.push_back(ReadMember(p, nullptr));
+        for (const Orbit::TypeInfo* f : member->GetFaults()) m.faults.push_back(FlatName(f).value_or(""));
+        out.methods.push_back(std::move(m));
+    }
+}
+
+TypeEntry ReadType(Orbit::Type* type, Orbit::Version* seenBy) {
+    TypeEntry e;
+    e.name = type->GetName();
+    e.flatName = type->GetWsdlName();
+    e.kind = type->GetKind();
+    e.version = VersionName(type);
+    e.ns = NamespaceOf(e.name);
+    if (auto* managed = dynamic_cast<Orbit::ManagedObjectType*>(type)) {
+        ReadManaged(managed, seenBy, e);
+    } else if (auto* data = dynamic_cast<Orbit::DataObjectType*>(type)) {
+        ReadData(data, seenBy, e);
+    } else if (auto* enumeration = dynamic_cast<Orbit::EnumType*>(type)) {
+        enumeration->GetEnumTags(e.tags);
+    }
+    return e;
+}
+
+}  // namespace
+
+std::string NamespaceOf(const std::string& wireName) {
+    std::string ns;
+    std::size_t start = 0;
+    while (start < wireName.size()) {
+        std::size_t dot = wireName.find('.', start);
+        if (dot == std::string::npos) break;  // the last segment always names a type
+        if (!std::islower(static_cast<unsigned char>(wireName[start]))) break;
+        ns = wireName.substr(0, dot);
+        start = dot + 1;
+    }
+    return ns;
+}
+
+Orbit::Version* FindVersion(const std::string& name) { return Orbit::GetVersionMap()->GetVersion(name); }
+
+Catalog ReadCatalog(Orbit::Version* seenBy) {
+    Orbit::VersionMap* versionMap = Orbit::GetVersionMap();
+    Orbit::TypeMap* typeMap = Orbit::GetTypeMap();
+    Catalog c;
+    if (seenBy != nullptr) c.seenBy = seenBy->GetName();
+    c.calls = {versionMap->AddVersionCalls(), versionMap->AddIncludedVersionCalls(), typeMap->AddTypeCalls()};
+
+    std::vector<Orbit::Version*> versions = versionMap->GetVersions();
+    for (Orbit::Version* v : versions) {
+        if (!Sees(seenBy, v)) continue;
+        VersionEntry e{v->GetName(), v->GetServiceNamespace(), v->GetVersionId(), v->GetFlags(), {}};
+        // As declared: a version's own entry is there only because the loaders declared it.
+        for (Orbit::Version* other : versions)
+            if (v->Includes(other)) e.includes.push_back(other->GetName());
+        c.versions.push_back(std::move(e));
+    }
+
+    // The runtime's own types and the stand-ins of other libraries share the map.
+    for (Orbit::Type* type : typeMap->GetTypes()) {
+        const std::string& name = type->GetName();
+        if (!name.starts_with(kTarnPrefix)) continue;
+        ++c.registeredTypes;
+        std::string ns = NamespaceOf(name);
+        if (std::find(c.loaders.begin(), c.loaders.end(), ns) == c.loaders.end()) c.loaders.push_back(ns);
+        if (seenBy != nullptr && !type->IsVisible(seenBy)) continue;
+        c.types.push_back(ReadType(type, seenBy));
+    }
+    return c;
+}
+
+}  // namespace tarncatalog

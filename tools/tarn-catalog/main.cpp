@@ -1,0 +1,84 @@
+// tarn-catalog: shows the tarn API as the runtime registered it. Linking
+// libtarn-types is what registers it: its loaders run before main.
+#include <exception>
+#include <iostream>
+#include <string>
+#include <vector>
+
+#include "args.h"
+#include "catalog.h"
+#include "json_output.h"
+#include "text_output.h"
+
+namespace {
+
+constexpr int kNotFound = 1;
+constexpr int kUsage = 2;
+
+int Fail(int status, const std::string& message) {
+    std::cerr << "tarn-catalog: " << message << "\n";
+    if (status == kUsage) std::cerr << "Try 'tarn-catalog --help'.\n";
+    return status;
+}
+
+int Run(const tarncatalog::Options& options) {
+    using tarncatalog::Command;
+    Orbit::Version* seenBy = nullptr;
+    if (options.version) {
+        seenBy = tarncatalog::FindVersion(*options.version);
+        if (seenBy == nullptr)
+            return Fail(kNotFound, "no version named '" + *options.version +
+                                       "' is registered ('tarn-catalog versions' lists them)");
+    }
+    tarncatalog::Catalog catalog = tarncatalog::ReadCatalog(seenBy);
+
+    switch (options.command) {
+    case Command::Help:
+        std::cout << tarncatalog::HelpText();
+        break;
+    case Command::List:
+        tarncatalog::WriteListing(catalog, std::cout);
+        break;
+    case Command::Versions:
+        tarncatalog::WriteVersions(catalog, std::cout);
+        break;
+    case Command::Dump:
+        tarncatalog::WriteJson(catalog, std::cout);
+        break;
+    case Command::Show: {
+        for (const tarncatalog::TypeEntry& t : catalog.types) {
+            if (t.name != options.typeName) continue;
+            tarncatalog::WriteType(catalog, t, std::cout);
+            return 0;
+        }
+        // Tell a hidden type from a missing one.
+        if (seenBy != nullptr) {
+            tarncatalog::Catalog all = tarncatalog::ReadCatalog(nullptr);
+            for (const tarncatalog::TypeEntry& t : all.types)
+                if (t.name == options.typeName)
+                    return Fail(kNotFound, "type '" + t.name + "' (" + t.version + ") is not visible to version '" +
+                                               *options.version + "'");
+        }
+        return Fail(kNotFound, "no tarn type with the wire name '" + options.typeName +
+                                   "' is registered ('tarn-catalog' lists them)");
+    }
+    }
+    std::cout.flush();
+    return std::cout ? 0 : kNotFound;
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    tarncatalog::Options options;
+    try {
+        options = tarncatalog::ParseArgs(std::vector<std::string>(argv + 1, argv + argc));
+    } catch (const tarncatalog::UsageError& e) {
+        return Fail(kUsage, e.what());
+    }
+    try {
+        return Run(options);
+    } catch (const std::exception& e) {
+        return Fail(kNotFound, std::string("failed: ") + e.what());
+    }
+}
