@@ -117,9 +117,11 @@ def render(results, stats):
     lines.append(
         f"Measured {context.get('date', '?')} on `{platform.node()}`: {os.cpu_count()} CPUs "
         f"(`nproc`), {cpu_model()}, {context.get('mhz_per_cpu', '?')} MHz; load average at the start "
-        f"{', '.join(f'{x:.2f}' for x in load) if load else '?'}; Google Benchmark "
-        f"{context.get('library_build_type', '?')} library build. Times are CPU time per operation: "
-        f"median and minimum of {max((s['n'] for s in stats.values()), default=0)} interleaved repetitions."
+        f"{', '.join(f'{x:.2f}' for x in load) if load else '?'}. Google Benchmark reports its own library "
+        f"as a {context.get('library_build_type', '?')} build (Debian's package), which affects only its loop. "
+        f"Times are CPU time per operation, median and minimum of "
+        f"{max((s['n'] for s in stats.values()), default=0)} interleaved repetitions; ratios are ours ÷ protobuf "
+        f"heap, of the medians and of the minimums."
     )
     lines.append("")
     have_protobuf = any(name.startswith("protobuf_heap/") for name in stats)
