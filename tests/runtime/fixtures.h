@@ -2,6 +2,8 @@
 // an enumeration and a managed interface with its stub, for tests of the runtime.
 #pragma once
 
+#include <gtest/gtest.h>
+
 #include <cstdint>
 #include <string>
 #include <thread>
@@ -197,4 +199,22 @@ void CreateAllTypes();
 // The versions the test records name: "test.version.v1", and "test.version.v2",
 // which includes it. Declared on the process's version map on first call.
 void DeclareTestVersions();
+}  // namespace Sample
+
+namespace Sample {
+
+// A test that must release everything it made; the sample types are made first,
+// since types live as long as the process.
+class NoLeakTest : public ::testing::Test {
+protected:
+    void SetUp() override {
+        CreateAllTypes();
+        _before = Kernite::ObjectImpl::LiveObjects();
+    }
+    void TearDown() override { EXPECT_EQ(Kernite::ObjectImpl::LiveObjects(), _before); }
+
+private:
+    long _before = 0;
+};
+
 }  // namespace Sample

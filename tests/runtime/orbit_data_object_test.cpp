@@ -52,17 +52,7 @@ std::vector<std::string> Diff(Any* a, Any* b, const std::string& path) {
     return diffs.GetPaths();
 }
 
-class DataObjectTest : public ::testing::Test {
-protected:
-    void SetUp() override {
-        Sample::CreateAllTypes();
-        _before = ObjectImpl::LiveObjects();
-    }
-    void TearDown() override { EXPECT_EQ(ObjectImpl::LiveObjects(), _before); }
-
-private:
-    long _before = 0;
-};
+using DataObjectTest = Sample::NoLeakTest;
 
 TEST_F(DataObjectTest, EqualityAndDifferencesCoverEveryPropertyKind) {
     Ref<Shape> full = Full();

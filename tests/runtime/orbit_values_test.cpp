@@ -26,17 +26,7 @@ Ref<Shape> MakeShape(const std::string& label) {
     return shape;
 }
 
-class ValuesTest : public ::testing::Test {
-protected:
-    void SetUp() override {
-        Sample::CreateAllTypes();
-        _before = ObjectImpl::LiveObjects();
-    }
-    void TearDown() override { EXPECT_EQ(ObjectImpl::LiveObjects(), _before); }
-
-private:
-    long _before = 0;
-};
+using ValuesTest = Sample::NoLeakTest;
 
 TEST_F(ValuesTest, BoxesAreSharedImmutableValues) {
     Ref<Any> red(new Primitive<Color>(Color::Red));
