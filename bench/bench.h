@@ -52,7 +52,7 @@ const TreeTexts& TextsFor(int n);
 inline const std::string kSnapshotType = "VirtualMachineSnapshot";
 inline const std::string kVmType = "VirtualMachine";
 inline const std::string kVmId = "vm-4711";
-inline const std::string kVmPathName = "[datastore1] vm-4711/vm-4711.vmx";
+inline const std::string kVmPathName = "/data/store-1/vm-4711/config";
 
 // A full host record's texts; record_get_set writes them back unchanged.
 inline const std::string kHostUuid = "4c4c4544-0042-4810-8056-b4c04f4e3432";

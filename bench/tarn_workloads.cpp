@@ -284,7 +284,7 @@ struct Served {
     Ref<DataArray<MoRef>> objects{new DataArray<MoRef>({new MoRef("VirtualMachine", "vm-1"),
                                                         new MoRef("VirtualMachine", "vm-2")})};
     Ref<Tarn::FaultInjector::Fault> fault{new Tarn::FaultInjector::Fault(
-        17, Kernite::Optional<std::string>("planted by the benchmark"), new Tarn::FaultInjector::NameTarget("vpxd"),
+        17, Kernite::Optional<std::string>("planted by the benchmark"), new Tarn::FaultInjector::NameTarget("svc-a"),
         new Tarn::FaultInjector::ProgressTrigger(50), new Tarn::FaultInjector::CrashAction())};
 
     Served() {

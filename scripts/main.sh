@@ -9,4 +9,4 @@ bash scripts/deps.sh
 build="${TARN_BUILD_DIR:-build/default}"
 cmake --preset default -B "$build" >&2
 cmake --build "$build" -j2 --target tarn-catalog >&2
-"$build/tools/tarn-catalog/tarn-catalog" --version tarn.version.version6
+"$build/tools/tarn-catalog/tarn-catalog" --api-version tarn.version.version6

@@ -103,11 +103,7 @@ Version* TypeImpl::GetVersion() const {
     return _record->version ? GetVersionMap()->GetVersion(_record->version) : nullptr;
 }
 
-bool TypeImpl::IsVisible(Version* version) const {
-    Version* own = GetVersion();
-    // A version sees what it introduced even when its self-inclusion was not declared.
-    return version != nullptr && own != nullptr && (own == version || version->Includes(own));
-}
+bool TypeImpl::IsVisible(Version* version) const { return version != nullptr && version->Sees(GetVersion()); }
 
 ArrayType::ArrayType(Type* itemType) : TypeImpl(MakeRecord(itemType)), _itemType(itemType) {}
 
@@ -127,6 +123,8 @@ const TypeInfo* ArrayType::MakeRecord(Type* itemType) {
 Type* Member::GetType() const { return typeRecord ? FindType(typeRecord) : nullptr; }
 
 Version* Member::GetVersion() const { return version.empty() ? nullptr : GetVersionMap()->GetVersion(version); }
+
+bool Member::IsVisible(const Version* seenBy) const { return seenBy != nullptr && seenBy->Sees(GetVersion()); }
 
 DataObjectType::DataObjectType(const DataTypeInfo* record)
     : TypeImpl(record ? record->header : nullptr), _info(record), _properties(ReadProperties(record->properties)) {}
@@ -169,6 +167,8 @@ ManagedMethod::ManagedMethod(ManagedObjectType* owner, int memberNumber, const P
       _result(MakeMember(*property)) {}
 
 Version* ManagedMethod::GetVersion() const { return _version.empty() ? nullptr : GetVersionMap()->GetVersion(_version); }
+
+bool ManagedMethod::IsVisible(const Version* seenBy) const { return seenBy != nullptr && seenBy->Sees(GetVersion()); }
 
 ManagedObjectType::ManagedObjectType(const ManagedTypeInfo* record)
     : TypeImpl(record ? record->header : nullptr), _info(record), _properties(ReadProperties(record->properties)) {

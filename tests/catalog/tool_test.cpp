@@ -126,18 +126,18 @@ TEST(Tool, ListsTheNamespacesInLoaderOrderWithEveryType) {
 TEST(Tool, VersionRestrictsTheListingToWhatItSees) {
     Orbit::Version* v6 = Orbit::GetVersionMap()->GetVersion("tarn.version.version6");
     ASSERT_NE(v6, nullptr);
-    Result r = RunTool("--version tarn.version.version6");
+    Result r = RunTool("--api-version tarn.version.version6");
     ASSERT_EQ(r.status, 0) << r.err;
     const auto visible = Names(TarnTypes(v6));
     EXPECT_EQ(ParseListing(r.out).types, visible);
     EXPECT_LT(visible.size(), TarnTypes().size());
     EXPECT_NE(r.out.find(std::to_string(visible.size()) + " of " + std::to_string(TarnTypes().size()) + " types"),
               std::string::npos);
-    EXPECT_EQ(RunTool("--version=tarn.version.version6 list").out, r.out);
+    EXPECT_EQ(RunTool("--api-version=tarn.version.version6 list").out, r.out);
     // The development version includes every version that a tarn type names.
-    EXPECT_EQ(ParseListing(RunTool("--version tarn.version.dev").out).types, Names(TarnTypes()));
+    EXPECT_EQ(ParseListing(RunTool("--api-version tarn.version.dev").out).types, Names(TarnTypes()));
 
-    Result versions = RunTool("--version tarn.version.version1 versions");
+    Result versions = RunTool("--api-version tarn.version.version1 versions");
     ASSERT_EQ(versions.status, 0) << versions.err;
     const auto lines = Lines(versions.out);
     EXPECT_EQ(lines.at(0), "Versions that tarn.version.version1 includes: 10");
@@ -174,12 +174,12 @@ TEST(Tool, ShowsAManagedTypeWithItsMemberNumbers) {
 }
 
 TEST(Tool, ShowHidesMembersTheVersionDoesNotSee) {
-    Result r = RunTool("--version tarn.version.version1 show tarn.ServiceInstance");
+    Result r = RunTool("--api-version tarn.version.version1 show tarn.ServiceInstance");
     ASSERT_EQ(r.status, 0) << r.err;
     EXPECT_NE(r.out.find("#3 dbSerializer"), std::string::npos) << r.out;
     EXPECT_EQ(r.out.find("hostPicker"), std::string::npos) << r.out;
     EXPECT_NE(r.out.find("does not see 3 members"), std::string::npos) << r.out;
-    EXPECT_NE(RunTool("--version tarn.version.version6 show tarn.ServiceInstance").out.find("#4 hostPicker"),
+    EXPECT_NE(RunTool("--api-version tarn.version.version6 show tarn.ServiceInstance").out.find("#4 hostPicker"),
               std::string::npos);
 
     Result tags = RunTool("show tarn.LockStresser.LockMode");
@@ -272,7 +272,7 @@ TEST(ToolJson, TypesCarryTheirRecords) {
 
 TEST(ToolJson, VersionKeepsOnlyWhatItIncludes) {
     Json full = Dump();
-    Json doc = Dump("--version tarn.version.version1");
+    Json doc = Dump("--api-version tarn.version.version1");
     std::set<std::string> seen;
     for (const Json& v : full["versions"].items)
         if (v["name"].text == "tarn.version.version1")
@@ -309,13 +309,13 @@ TEST(Tool, BadNamesAndBadCommandLinesFailClearly) {
     const Case cases[] = {
         {"show tarn.NoSuchType", 1, "'tarn.NoSuchType'"},
         {"show cairn.TaskInfo", 1, "no tarn type"},
-        {"--version tarn.version.version1 show tarn.AlertManager", 1, "not visible to version 'tarn.version.version1'"},
-        {"--version tarn.version.version99", 1, "no version named 'tarn.version.version99'"},
-        {"--version tarn.version.version99 dump --json", 1, "tarn.version.version99"},
+        {"--api-version tarn.version.version1 show tarn.AlertManager", 1, "not visible to version 'tarn.version.version1'"},
+        {"--api-version tarn.version.version99", 1, "no version named 'tarn.version.version99'"},
+        {"--api-version tarn.version.version99 dump --json", 1, "tarn.version.version99"},
         {"frobnicate", 2, "unknown command 'frobnicate'"},
         {"--frobnicate", 2, "unknown option '--frobnicate'"},
-        {"--version", 2, "needs a version name"},
-        {"--version tarn.version.version1 --version tarn.version.version6", 2, "twice"},
+        {"--api-version", 2, "needs a version name"},
+        {"--api-version tarn.version.version1 --api-version tarn.version.version6", 2, "twice"},
         {"show", 2, "exactly one wire name"},
         {"show tarn.DebugManager tarn.LockStresser", 2, "exactly one wire name"},
         {"dump", 2, "dump --json"},
@@ -333,10 +333,13 @@ TEST(Tool, HelpDocumentsEveryCommandAndOption) {
     Result r = RunTool("--help");
     ASSERT_EQ(r.status, 0);
     EXPECT_EQ(r.err, "");
-    for (const char* word : {"list", "show WIRE-NAME", "versions", "dump --json", "--version NAME", "Exit status"})
+    for (const char* word : {"list", "show WIRE-NAME", "versions", "dump --json", "--api-version NAME", "Exit status"})
         EXPECT_NE(r.out.find(word), std::string::npos) << word;
     EXPECT_EQ(RunTool("-h").out, r.out);
     EXPECT_EQ(RunTool("show --help").out, r.out);
+    // --version is the tool's own version, whatever else the line holds.
+    EXPECT_TRUE(RunTool("--version").out.starts_with("tarn-catalog " TARN_VERSION "\n"));
+    EXPECT_EQ(RunTool("list --version").out, RunTool("--version").out);
 }
 
 }  // namespace

@@ -112,7 +112,7 @@ TEST_F(DataObjectTest, FtSyncContextTakesTheChainsFourteenParametersThenItsOwn) 
     const DateTime start = DateTime::FromMicroseconds(1'700'000'000'123'456);
     const long long migrationId = (1LL << 40) + 7;
 
-    auto ctx = Make<FtSyncContext>(cbData.Get(), srcVm.Get(), srcLocation.Get(), Optional<std::string>("/dst/vm.vmx"),
+    auto ctx = Make<FtSyncContext>(cbData.Get(), srcVm.Get(), srcLocation.Get(), Optional<std::string>("/d/vm-2/cfg"),
                                    dstLocation.Get(), spec.Get(), MovePriority::highPriority, true, migrationId,
                                    Optional<bool>(false), Optional<DateTime>(start), dstResult.Get(),
                                    srcResult.Get(), Optional<int>(3), std::string("/dst/ft.cfg"));
@@ -121,7 +121,7 @@ TEST_F(DataObjectTest, FtSyncContextTakesTheChainsFourteenParametersThenItsOwn) 
     EXPECT_EQ(cbData->GetRefCount(), 2);  // shared, not copied
     EXPECT_EQ(ctx->GetSrcVmState(), srcVm.Get());
     EXPECT_EQ(ctx->GetSrcLocation(), srcLocation.Get());
-    EXPECT_EQ(ctx->GetDstVmPathName().GetValue(), "/dst/vm.vmx");
+    EXPECT_EQ(ctx->GetDstVmPathName().GetValue(), "/d/vm-2/cfg");
     EXPECT_EQ(ctx->GetDstLocation(), dstLocation.Get());
     EXPECT_EQ(ctx->GetSpec(), spec.Get());
     EXPECT_EQ(ctx->GetPriority(), MovePriority::highPriority);
@@ -172,7 +172,7 @@ TEST_F(DataObjectTest, CopyOfAVmStateSharesNothingDownToTheLastSnapshot) {
     auto r0 = Snap("r0", 1, {c0.Get(), c1.Get()});
     auto r1 = Snap("r1", 5, {});
     Ref<DataArray<SnapshotState>> roots(new DataArray<SnapshotState>{r0.Get(), r1.Get()});
-    auto source = Make<VmState>(Mo("VirtualMachine", "vm-1").Get(), std::string("/vmfs/vm.vmx"),
+    auto source = Make<VmState>(Mo("VirtualMachine", "vm-1").Get(), std::string("/d/vm-1/conf"),
                                 Cairn::VirtualMachine::PowerState::poweredOn, Make<Cairn::Vm::ConfigInfo>().Get(),
                                 Make<Cairn::Vm::FileLayoutEx>().Get(), Make<Cairn::Vm::Capability>().Get(),
                                 roots.Get());
@@ -396,7 +396,7 @@ TEST_F(DataObjectTest, SizeIsTheSumOfObjectAndHeldMemory) {
         auto ft = Make<FtSyncContext>();
         const unsigned int bare = f(sizeof(FtSyncContext)) + f(0);
         EXPECT_EQ(ft->_GetSize(f), bare);
-        ft->SetDstVmPathName(std::string("/vmfs/volumes/datastore-1/some/long/path/vm.vmx"));
+        ft->SetDstVmPathName(std::string("/data/store-1/some/long/path/vm-1/config"));
         const std::string& path = ft->GetDstVmPathName().GetValue();
         EXPECT_EQ(ft->_GetSize(f), bare + f(sizeof(std::string)) + f(StringHeap(path)));
         ft->SetSrcVmState(Make<VmState>().Get());

@@ -153,11 +153,11 @@ TEST_F(LoopbackTest, DebugManagerCallsReachTheImplementation) {
 
     Ref<MoRef> task;
     auto vm = Mo("VirtualMachine", "vm-3");
-    stub->TraceOperation(vm.Get(), Orbit::MethodName("vim.VirtualMachine.reset"), nullptr, task);
+    stub->TraceOperation(vm.Get(), Orbit::MethodName("cairn.VirtualMachine.reset"), nullptr, task);
     ASSERT_NE(task, nullptr);
     EXPECT_EQ(task->GetId(), "task-trace");
     EXPECT_EQ(impl->tracedObject.Get(), vm.Get());
-    EXPECT_EQ(impl->tracedMethod, "vim.VirtualMachine.reset");
+    EXPECT_EQ(impl->tracedMethod, "cairn.VirtualMachine.reset");
 
     Ref<MoRef> manager;
     stub->GetFaultManager(manager);
@@ -184,7 +184,7 @@ TEST_F(LoopbackTest, FaultInjectionResultsComeBackUnboxedSyncAndAsync) {
     ASSERT_NE(stub, nullptr);
 
     auto fault = Make<Fault>(7, Kernite::Optional<std::string>("crash on 40%"),
-                             Make<Tarn::FaultInjector::NameTarget>(std::string("vpxd")).Get(),
+                             Make<Tarn::FaultInjector::NameTarget>(std::string("svc-a")).Get(),
                              Make<Tarn::FaultInjector::ProgressTrigger>(40).Get(),
                              Make<Tarn::FaultInjector::CrashAction>().Get());
     EXPECT_EQ(stub->AddFault(fault.Get()), 7);

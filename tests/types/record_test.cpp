@@ -120,11 +120,11 @@ TEST_F(RecordTest, ReferencesAreSharedAndOptionalOnesUnset) {
     const DataTypeInfo* faultRecord = RecordOf<Tarn::FaultInjector::Fault>();
     auto fault = Make<Tarn::FaultInjector::Fault>();
     EXPECT_FALSE(faultRecord->isPropertySet(fault.Get(), 2));
-    WriteObject(faultRecord, fault.Get(), 2, Make<Tarn::FaultInjector::NameTarget>(std::string("vpxd")).Get());
+    WriteObject(faultRecord, fault.Get(), 2, Make<Tarn::FaultInjector::NameTarget>(std::string("svc-a")).Get());
     EXPECT_TRUE(faultRecord->isPropertySet(fault.Get(), 2));
     faultRecord->unsetProperty(fault.Get(), 2);
     ASSERT_NE(fault->GetTarget(), nullptr);
-    EXPECT_EQ(static_cast<Tarn::FaultInjector::NameTarget*>(fault->GetTarget())->GetName(), "vpxd");
+    EXPECT_EQ(static_cast<Tarn::FaultInjector::NameTarget*>(fault->GetTarget())->GetName(), "svc-a");
     WriteObject(faultRecord, fault.Get(), 2, nullptr);  // null clears it
     EXPECT_EQ(fault->GetTarget(), nullptr);
 }
@@ -289,7 +289,7 @@ TEST_F(RecordTest, EveryKindRoundTripsFromAccessorsToRecords) {
     Everything e;
     e.ft->SetCbData(e.cbData.Get());
     e.ft->SetSrcVmState(e.vmState.Get());
-    e.ft->SetDstVmPathName(std::string("/dst/vm.vmx"));
+    e.ft->SetDstVmPathName(std::string("/d/vm-2/cfg"));
     e.ft->SetDstLocation(e.location.Get());
     e.ft->SetSpec(e.spec.Get());
     e.ft->SetPriority(Cairn::VirtualMachine::MovePriority::defaultPriority);
@@ -316,7 +316,7 @@ TEST_F(RecordTest, EveryKindRoundTripsFromAccessorsToRecords) {
     EXPECT_EQ(ReadRef(RecordOf<Context>(), ft, 0).Get(), e.cbData.Get());
     EXPECT_EQ(ReadRef(RecordOf<VmContext>(), ft, 0).Get(), e.vmState.Get());
     EXPECT_EQ(ReadRef(RecordOf<VmContext>(), ft, 1), nullptr);
-    EXPECT_EQ(Read<std::string>(RecordOf<MobilityContext>(), ft, 0), "/dst/vm.vmx");
+    EXPECT_EQ(Read<std::string>(RecordOf<MobilityContext>(), ft, 0), "/d/vm-2/cfg");
     EXPECT_EQ(ReadRef(RecordOf<MobilityContext>(), ft, 1).Get(), e.location.Get());
     const DataTypeInfo* migrate = RecordOf<MigrateContext>();
     {
@@ -357,7 +357,7 @@ TEST_F(RecordTest, EveryKindRoundTripsFromRecordsToAccessors) {
     FtSyncContext* ft = e.ft.Get();
     WriteObject(RecordOf<Context>(), ft, 0, e.cbData.Get());
     WriteObject(RecordOf<VmContext>(), ft, 0, e.vmState.Get());
-    Write<std::string>(RecordOf<MobilityContext>(), ft, 0, "/dst/vm.vmx");
+    Write<std::string>(RecordOf<MobilityContext>(), ft, 0, "/d/vm-2/cfg");
     WriteObject(RecordOf<MobilityContext>(), ft, 1, e.location.Get());
     const DataTypeInfo* migrate = RecordOf<MigrateContext>();
     WriteObject(migrate, ft, 0, e.spec.Get());
@@ -371,7 +371,7 @@ TEST_F(RecordTest, EveryKindRoundTripsFromRecordsToAccessors) {
 
     EXPECT_EQ(ft->GetCbData(), e.cbData.Get());
     EXPECT_EQ(ft->GetSrcVmState(), e.vmState.Get());
-    EXPECT_EQ(ft->GetDstVmPathName().GetValue(), "/dst/vm.vmx");
+    EXPECT_EQ(ft->GetDstVmPathName().GetValue(), "/d/vm-2/cfg");
     EXPECT_EQ(ft->GetDstLocation(), e.location.Get());
     EXPECT_EQ(ft->GetSpec(), e.spec.Get());
     EXPECT_EQ(ft->GetPriority(), Cairn::VirtualMachine::MovePriority::highPriority);
@@ -426,7 +426,7 @@ TEST_F(RecordTest, EveryKindRoundTripsFromRecordsToAccessors) {
 
 TEST_F(RecordTest, EqualityAndDifferencesWalkTheWholeChain) {
     auto source = Make<FtSyncContext>();
-    source->SetSrcVmState(Make<VmState>(Mo("VirtualMachine", "vm-1").Get(), std::string("/a.vmx"),
+    source->SetSrcVmState(Make<VmState>(Mo("VirtualMachine", "vm-1").Get(), std::string("/a/cfg"),
                                         Cairn::VirtualMachine::PowerState::poweredOff, nullptr, nullptr, nullptr,
                                         nullptr)
                               .Get());
@@ -436,7 +436,7 @@ TEST_F(RecordTest, EqualityAndDifferencesWalkTheWholeChain) {
     EXPECT_TRUE(source->_IsEqual(copy.Get()));
     EXPECT_TRUE(copy->_IsEqual(source.Get()));
 
-    copy->GetSrcVmState()->SetVmPathName("/b.vmx");
+    copy->GetSrcVmState()->SetVmPathName("/b/cfg");
     copy->SetNumGlideDisks(Optional<int>());
     copy->SetDstCfgFile("/b.cfg");
     EXPECT_FALSE(source->_IsEqual(copy.Get()));

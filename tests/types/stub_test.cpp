@@ -169,12 +169,12 @@ TEST_F(StubTest, TraceOperationAnswersWithTheTaskNotItsResult) {
     auto task = Mo("Task", "task-42");
     adapter->answer = task.Get();
     Ref<MoRef> result;
-    stub->TraceOperation(target.Get(), Orbit::MethodName("vim.VirtualMachine.powerOn"), args.Get(), result);
+    stub->TraceOperation(target.Get(), Orbit::MethodName("cairn.VirtualMachine.powerOn"), args.Get(), result);
     EXPECT_EQ(result.Get(), task.Get());
     EXPECT_EQ(Last().method, gTarnDebugManagerMethodObjects[4]);
     ASSERT_EQ(Last().args.size(), 3u);
     EXPECT_EQ(Last().args[0].Get(), target.Get());
-    EXPECT_EQ(Boxed<Orbit::MethodName>(Last().args[1]).GetName(), "vim.VirtualMachine.powerOn");
+    EXPECT_EQ(Boxed<Orbit::MethodName>(Last().args[1]).GetName(), "cairn.VirtualMachine.powerOn");
     EXPECT_EQ(Last().args[2].Get(), args.Get());
 
     // The declared result type is the task's business, not the stub's: a trace

@@ -9,18 +9,19 @@ Options ParseArgs(const std::vector<std::string>& args) {
     for (std::size_t i = 0; i < args.size(); ++i) {
         const std::string& a = args[i];
         if (a == "--help" || a == "-h") return Options{Command::Help, {}, {}};
+        if (a == "--version") return Options{Command::ToolVersion, {}, {}};
         if (a == "--json") {
             json = true;
-        } else if (a == "--version" || a.starts_with("--version=")) {
-            if (o.version) throw UsageError("--version given twice");
+        } else if (a == "--api-version" || a.starts_with("--api-version=")) {
+            if (o.version) throw UsageError("--api-version given twice");
             std::string value;
-            if (a == "--version") {
-                if (i + 1 >= args.size()) throw UsageError("--version needs a version name");
+            if (a == "--api-version") {
+                if (i + 1 >= args.size()) throw UsageError("--api-version needs a version name");
                 value = args[++i];
             } else {
-                value = a.substr(std::string("--version=").size());
+                value = a.substr(std::string("--api-version=").size());
             }
-            if (value.empty() || value.starts_with("-")) throw UsageError("--version needs a version name");
+            if (value.empty() || value.starts_with("-")) throw UsageError("--api-version needs a version name");
             o.version = value;
         } else if (a.starts_with("-")) {
             throw UsageError("unknown option '" + a + "'");
@@ -51,7 +52,7 @@ Options ParseArgs(const std::vector<std::string>& args) {
 }
 
 const char* HelpText() {
-    return R"(Usage: tarn-catalog [--version NAME] [COMMAND]
+    return R"(Usage: tarn-catalog [--api-version NAME] [COMMAND]
 
 Shows the tarn API as the runtime registered it when libtarn-types loaded: what
 the loaders put in the runtime's type and version maps, read back from there.
@@ -70,10 +71,13 @@ Commands:
                     {"loaders", "calls", "versions", "types"}
 
 Options:
-  --version NAME    restrict any command to what version NAME sees: a type,
-                    property or method is shown when NAME includes the version
-                    that introduced it; versions are restricted to those NAME
-                    includes; loaders and call counts stay as registered
+  --api-version NAME
+                    restrict any command to what API version NAME sees: a
+                    type, property or method is shown when NAME includes the
+                    version that introduced it; versions are restricted to
+                    those NAME includes; loaders and call counts stay as
+                    registered
+  --version         the tool's own version
   --json            with 'dump': write JSON
   -h, --help        this text
 
@@ -85,9 +89,9 @@ Exit status: 0 done; 1 unknown type or version, or a type the chosen version doe
 not see; 2 a command line that does not parse.
 
 Examples:
-  tarn-catalog --version tarn.version.version6
+  tarn-catalog --api-version tarn.version.version6
   tarn-catalog show tarn.DebugManager
-  tarn-catalog --version tarn.version.version1 show tarn.ServiceInstance
+  tarn-catalog --api-version tarn.version.version1 show tarn.ServiceInstance
   tarn-catalog dump --json
 )";
 }

@@ -8,12 +8,12 @@
 
 namespace tarncatalog {
 
-enum class Command { List, Show, Versions, Dump, Help };
+enum class Command { List, Show, Versions, Dump, Help, ToolVersion };
 
 struct Options {
     Command command = Command::List;
     std::string typeName;               // show
-    std::optional<std::string> version;  // --version
+    std::optional<std::string> version;  // --api-version
 };
 
 // A command line that does not parse; the message says what is wrong.

@@ -10,15 +10,9 @@ namespace {
 
 constexpr const char* kTarnPrefix = "tarn.";
 
-// The same rule as Type::IsVisible, for members: a version sees what it
-// introduced and what the versions it includes introduced.
+// No version chosen: everything is shown.
 bool Sees(Orbit::Version* seenBy, Orbit::Version* introducedIn) {
-    if (seenBy == nullptr) return true;
-    return introducedIn != nullptr && (seenBy == introducedIn || seenBy->Includes(introducedIn));
-}
-
-bool Sees(Orbit::Version* seenBy, const std::string& versionName) {
-    return seenBy == nullptr || Sees(seenBy, FindVersion(versionName));
+    return seenBy == nullptr || seenBy->Sees(introducedIn);
 }
 
 std::optional<std::string> Text(const char* s) {
@@ -59,7 +53,7 @@ void ReadData(Orbit::DataObjectType* type, Orbit::Version* seenBy, TypeEntry& ou
     out.base = BaseName(type->GetBaseType(), type->GetDataTypeInfo()->base);
     const auto& properties = type->GetProperties();
     for (std::size_t i = 0; i < properties.size(); ++i) {
-        if (!Sees(seenBy, properties[i].version)) {
+        if (seenBy != nullptr && !properties[i].IsVisible(seenBy)) {
             ++out.hiddenMembers;
             continue;
         }
@@ -72,7 +66,7 @@ void ReadData(Orbit::DataObjectType* type, Orbit::Version* seenBy, TypeEntry& ou
 void ReadManaged(Orbit::ManagedObjectType* type, Orbit::Version* seenBy, TypeEntry& out) {
     out.base = BaseName(type->GetBaseType(), type->GetManagedTypeInfo()->base);
     for (const auto& member : type->GetMembers()) {
-        if (!Sees(seenBy, member->GetVersionName())) {
+        if (seenBy != nullptr && !member->IsVisible(seenBy)) {
             ++out.hiddenMembers;
             continue;
         }

@@ -36,6 +36,9 @@ int Run(const tarncatalog::Options& options) {
     case Command::Help:
         std::cout << tarncatalog::HelpText();
         break;
+    case Command::ToolVersion:
+        std::cout << "tarn-catalog " << TARN_VERSION << "\n";
+        break;
     case Command::List:
         tarncatalog::WriteListing(catalog, std::cout);
         break;

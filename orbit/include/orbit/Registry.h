@@ -29,6 +29,12 @@ public:
 
     // Whether `other` was declared as included in this version.
     bool Includes(const Version* other) const;
+    // Whether this version sees what `introducedIn` introduced: its own additions and
+    // those of every version it includes. The one visibility rule of the runtime;
+    // types, members and tools all ask it. Null sees nothing and is seen by none.
+    bool Sees(const Version* introducedIn) const {
+        return introducedIn != nullptr && (introducedIn == this || Includes(introducedIn));
+    }
     // The included versions in the order they were declared.
     std::vector<Version*> GetIncluded() const;
 

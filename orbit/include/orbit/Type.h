@@ -88,6 +88,8 @@ struct Member {
     // The item type (for an array, the type of one item); null if unresolved.
     Type* GetType() const;
     Version* GetVersion() const;
+    // Whether `version` sees this member (Version::Sees on the member's version).
+    bool IsVisible(const Version* version) const;
 };
 
 class DataObjectType : public TypeImpl {
@@ -120,6 +122,7 @@ public:
     const char* GetPrivilege() const noexcept { return _privilege; }
     const std::string& GetVersionName() const noexcept { return _version; }
     Version* GetVersion() const;
+    bool IsVisible(const Version* version) const;
     bool IsTask() const noexcept { return _task; }
     bool IsPropertyGetter() const noexcept { return _getter; }
     int GetMemberNumber() const noexcept { return _memberNumber; }
