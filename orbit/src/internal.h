@@ -10,7 +10,7 @@ class Type;
 
 namespace detail {
 
-inline constexpr const char* kRuntimeVersion = "strata.version.version0";
+inline constexpr const char* kRuntimeVersion = kNoneVersion;
 
 // Registration records of the runtime's own data and managed types.
 extern const DataTypeInfo kDynamicDataInfo;

@@ -1,157 +1,163 @@
-// A bad catalogue stops the build with "file:line: message"; these pin the line.
+// A bad catalogue stops the build with "file:line: message"; each row pins the line.
 #include <gtest/gtest.h>
+
+#include <cctype>
 
 #include "model.h"
 
 namespace tarngen {
 namespace {
 
-const char* kVersions =
+constexpr const char* kVersions =
     "version strata.version.version0 namespace - id - flag 0\n"
-    "version tarn.version.version1 namespace tarnd3 id 1.0 flag 0 includes strata.version.version0\n";
+    "version tarn.version.version1 namespace svc-a id 1.0 flag 0 includes strata.version.version0\n";
+constexpr const char* kV1 = " version tarn.version.version1";
 
-struct Outcome {
-    int line = 0;
-    std::string file;
-    std::string message;
+// A catalogue of up to three files beside the version list; where it fails.
+struct Case {
+    Case(const char* what, std::string text, int line, const char* fragment, const char* file = "idl/tarn.t.idl",
+         std::string loaders = "loaders tarn.t\n", std::string versions = kVersions, std::string other = "")
+        : what(what), text(std::move(text)), line(line), fragment(fragment), file(file), loaders(std::move(loaders)),
+          versions(std::move(versions)), other(std::move(other)) {}
+    const char* what;
+    std::string text;      // idl/tarn.t.idl
+    int line;              // expected; 0 for a whole-catalogue error
+    const char* fragment;  // expected in the message
+    const char* file;
+    std::string loaders;   // idl/library.idl
+    std::string versions;  // idl/versions.idl
+    std::string other;     // idl/tarn.u.idl, when not empty
 };
 
-// Resolves `text` as the catalogue of namespace "tarn.t" beside a valid version list
-// and loader order; returns where it failed (line 0: it did not fail).
-Outcome Check(const std::string& text, const std::string& loaders = "loaders tarn.t\n") {
-    Outcome outcome;
-    try {
-        std::vector<FileSyntax> files;
-        files.push_back(ParseFile("idl/versions.idl", kVersions));
-        files.push_back(ParseFile("idl/library.idl", loaders));
-        files.push_back(ParseFile("idl/tarn.t.idl", text));
-        Resolve(std::move(files));
-    } catch (const CatalogueError& e) {
-        outcome.line = e.location.line;
-        outcome.file = e.location.file;
-        outcome.message = e.what();
-    }
-    return outcome;
-}
+std::string T(const std::string& lines) { return "namespace tarn.t\n" + lines; }
 
-TEST(CatalogueErrors, ValidCatalogueResolves) {
-    Outcome o = Check(
-        "namespace tarn.t\n"
-        "managed M version tarn.version.version1\n"
-        "  method run wsdl Run version tarn.version.version1\n"
-        "    param d D\n"
-        "    result string version strata.version.version0\n"
-        "  property name string flags 4 version tarn.version.version1\n"
-        "data D version tarn.version.version1\n"
-        "  property items D flags 3 version tarn.version.version1\n"
-        "enum M.Mode version tarn.version.version1\n"
-        "  tags a b\n");
-    EXPECT_EQ(o.line, 0) << o.message;
-}
-
-TEST(CatalogueErrors, UnknownNamesAreReportedWhereTheyAreUsed) {
-    Outcome type = Check("namespace tarn.t\ndata D version tarn.version.version1\n  property p Nowhere flags 0 version tarn.version.version1\n");
-    EXPECT_EQ(type.line, 3);
-    EXPECT_EQ(type.file, "idl/tarn.t.idl");
-    EXPECT_NE(type.message.find("unknown type 'Nowhere'"), std::string::npos) << type.message;
-
-    Outcome version = Check("namespace tarn.t\n\ndata D version tarn.version.version9\n");
-    EXPECT_EQ(version.line, 3);
-    EXPECT_NE(version.message.find("tarn.version.version9"), std::string::npos);
-
-    Outcome base = Check("namespace tarn.t\ndata D : Missing version tarn.version.version1\n");
-    EXPECT_EQ(base.line, 2);
-
-    Outcome outer = Check("namespace tarn.t\ndata Outer.Inner version tarn.version.version1\n");
-    EXPECT_EQ(outer.line, 2);
-    EXPECT_NE(outer.message.find("outer type"), std::string::npos);
-}
-
-TEST(CatalogueErrors, DuplicatesNameTheSecondDeclaration) {
-    Outcome type = Check("namespace tarn.t\ndata D version tarn.version.version1\n\ndata D version tarn.version.version1\n");
-    EXPECT_EQ(type.line, 4);
-    EXPECT_NE(type.message.find("idl/tarn.t.idl:2"), std::string::npos) << "names the first declaration: " << type.message;
-
-    Outcome property = Check(
-        "namespace tarn.t\ndata D version tarn.version.version1\n"
-        "  property p int flags 0 version tarn.version.version1\n"
-        "  property p int flags 0 version tarn.version.version1\n");
-    EXPECT_EQ(property.line, 4);
-
-    Outcome tag = Check("namespace tarn.t\nenum E version tarn.version.version1\n  tags a b\n  tags a\n");
-    EXPECT_EQ(tag.line, 3);
-
-    Outcome runtime = Check("namespace tarn.t\ndata D version tarn.version.version1\n", "loaders tarn.t tarn.t\n");
-    EXPECT_NE(runtime.message.find("listed twice"), std::string::npos);
-}
-
-TEST(CatalogueErrors, FlagWordsAreZeroToSeven) {
-    Outcome o = Check("namespace tarn.t\ndata D version tarn.version.version1\n  property p int flags 8 version tarn.version.version1\n");
-    EXPECT_EQ(o.line, 3);
-    EXPECT_NE(o.message.find("from 0 to 7"), std::string::npos) << o.message;
-    EXPECT_EQ(Check("namespace tarn.t\ndata D version tarn.version.version1\n  property p int flags x version tarn.version.version1\n").line, 3);
-    EXPECT_EQ(Check("namespace tarn.t\ndata D version tarn.version.version1\n  property p int version tarn.version.version1\n").line, 3)
-        << "a property must state its flags";
-}
-
-TEST(CatalogueErrors, ManagedMembersMustNotCollide) {
-    // The getter of "name" and the operation of "getName" are both GetName.
-    Outcome own = Check(
-        "namespace tarn.t\nmanaged M version tarn.version.version1\n"
-        "  method getName version tarn.version.version1\n"
-        "  property name string flags 4 version tarn.version.version1\n");
-    EXPECT_EQ(own.line, 4);
-    EXPECT_NE(own.message.find("GetName"), std::string::npos);
-
-    // So do members inherited from a base interface.
-    Outcome inherited = Check(
-        "namespace tarn.t\nmanaged A version tarn.version.version1\n"
-        "  method run version tarn.version.version1\n"
-        "managed B : A version tarn.version.version1\n"
-        "  method Run version tarn.version.version1\n");
-    EXPECT_EQ(inherited.line, 5);
-
-    Outcome runtime = Check(
-        "namespace tarn.t\nmanaged M version tarn.version.version1\n"
-        "  property refCount int flags 4 version tarn.version.version1\n");
-    EXPECT_EQ(runtime.line, 3);
-}
-
-TEST(CatalogueErrors, KindsAndSignaturesAreChecked) {
-    EXPECT_EQ(Check("namespace tarn.t\ndata D version tarn.version.version1\nmanaged M : D version tarn.version.version1\n").line, 3)
-        << "a managed type cannot derive from a data object";
-    EXPECT_EQ(Check("namespace tarn.t\nmanaged M version tarn.version.version1\n"
-                    "  method m version tarn.version.version1\n    param p int flags 2\n").line, 4)
-        << "an optional int cannot be passed by value";
-    EXPECT_EQ(Check("namespace tarn.t\nmanaged M version tarn.version.version1\n"
-                    "  method m version tarn.version.version1\n    throws M\n").line, 4)
-        << "only faults can be thrown";
-    EXPECT_EQ(Check("namespace tarn.t\nmanaged M version tarn.version.version1\n"
-                    "  method m version tarn.version.version1 task\n").line, 3)
-        << "a task method's wsdl name ends in _Task";
-    EXPECT_EQ(Check("namespace tarn.t\ndata D version tarn.version.version1\n  method m version tarn.version.version1\n").line, 3);
-    EXPECT_EQ(Check("namespace tarn.t\n  param p int\n").line, 2);
-    EXPECT_EQ(Check("namespace tarn.t\ndata D version tarn.version.version1 colour blue\n").line, 2);
-    EXPECT_EQ(Check("namespace tarn.t\ndata d version tarn.version.version1\n").line, 2) << "type names are capitalised";
-}
-
-TEST(CatalogueErrors, TheLoaderOrderNamesEveryNamespace) {
-    Outcome missing = Check("namespace tarn.t\n", "loaders tarn.other\n");
-    EXPECT_EQ(missing.line, 1);
-    EXPECT_EQ(missing.file, "idl/library.idl");
-}
-
-TEST(CatalogueErrors, VersionInclusionsMustResolveAndNotCycle) {
+CatalogueError Failure(const Case& c) {
     std::vector<FileSyntax> files;
-    files.push_back(ParseFile("idl/versions.idl",
-                              "version a namespace - id - flag 0 includes b\n"
-                              "version b namespace - id - flag 0 includes a\n"));
     try {
+        files.push_back(ParseFile("idl/versions.idl", c.versions));
+        files.push_back(ParseFile("idl/library.idl", c.loaders));
+        files.push_back(ParseFile("idl/tarn.t.idl", c.text));
+        if (!c.other.empty()) files.push_back(ParseFile("idl/tarn.u.idl", c.other));
         Resolve(std::move(files));
-        FAIL() << "a cycle of inclusions was accepted";
     } catch (const CatalogueError& e) {
-        EXPECT_NE(std::string(e.what()).find("cycle"), std::string::npos);
+        return e;
     }
+    return CatalogueError({}, "accepted");
+}
+
+const std::string kData = "data D" + std::string(kV1) + "\n";
+std::string Prop(const std::string& name, const std::string& type, int flags = 0) {
+    return "  property " + name + " " + type + " flags " + std::to_string(flags) + kV1 + "\n";
+}
+std::string Method(const std::string& name, const std::string& options = "") {
+    return "  method " + name + options + kV1 + "\n";
+}
+
+const Case kCases[] = {
+    // Versions and the loader order.
+    {"no versions", T(""), 0, "no versions are catalogued", "idl", "loaders tarn.t\n", " "},
+    {"version twice", T(""), 3, "declared twice", "idl/versions.idl", "loaders tarn.t\n",
+     std::string(kVersions) + "version tarn.version.version1 namespace - id - flag 0\n"},
+    {"unknown inclusion", T(""), 1, "unknown version 'nowhere'", "idl/versions.idl", "loaders tarn.t\n",
+     "version a namespace - id - flag 0 includes nowhere\n"},
+    {"inclusion cycle", T(""), 1, "cycle", "idl/versions.idl", "loaders tarn.t\n",
+     "version a namespace - id - flag 0 includes b\nversion b namespace - id - flag 0 includes a\n"},
+    {"unknown version", T("\ndata D version tarn.version.version9\n"), 3, "tarn.version.version9"},
+    {"no loader order", T(""), 0, "no 'loaders' statement", "idl", " "},
+    {"loader order twice", T(""), 1, "stated twice", "idl/tarn.u.idl", "loaders tarn.t\n", kVersions, "loaders tarn.t\n"},
+    {"loader of no file", T(""), 1, "no catalogue file declares namespace 'tarn.other'", "idl/library.idl",
+     "loaders tarn.t tarn.other\n"},
+    {"loader listed twice", T(""), 1, "listed twice", "idl/library.idl", "loaders tarn.t tarn.t\n"},
+    {"namespace not in the loader order", T(""), 1, "'tarn.u' is missing from the loader order", "idl/library.idl",
+     "loaders tarn.t\n", kVersions, "namespace tarn.u\n"},
+    {"namespace in two files", T(""), 1, "also catalogued in idl/tarn.t.idl", "idl/tarn.u.idl", "loaders tarn.t\n", kVersions,
+     "namespace tarn.t\n"},
+    // Types.
+    {"lower-case type", T("data d" + std::string(kV1) + "\n"), 2, "must start with a capital letter"},
+    {"type twice", T(kData + "\n" + kData), 4, "already declared (idl/tarn.t.idl:2)"},
+    {"runtime type redeclared", "namespace strata\ndata DynamicData" + std::string(kV1) + "\n", 2, "already declared (the runtime)",
+     "idl/tarn.t.idl", "loaders strata\n"},
+    {"unknown property type", T(kData + Prop("p", "Nowhere")), 3, "unknown type 'Nowhere'"},
+    {"root used as a value", T(kData + Prop("p", "strata.DynamicData", 2)), 3, "is a base, not a value type"},
+    {"outer type missing", T("data Outer.Inner" + std::string(kV1) + "\n"), 2, "outer type 'tarn.t.Outer'"},
+    {"nested in an enumeration", T("enum E" + std::string(kV1) + "\n  tags a\ndata E.F" + kV1 + "\n"), 4,
+     "an enumeration cannot hold nested types"},
+    {"unknown base", T("data D : Missing" + std::string(kV1) + "\n"), 2, "unknown base 'Missing'"},
+    {"base of another kind", T(kData + "managed M : D" + kV1 + "\n"), 3, "must be another managed type"},
+    {"base chain cycle", T("data A : B" + std::string(kV1) + "\ndata B : A" + kV1 + "\n"), 2, "is a cycle"},
+    {"enumeration without tags", T("enum E" + std::string(kV1) + "\n"), 2, "has no tags"},
+    {"tag twice", T("enum E" + std::string(kV1) + "\n  tags a b\n  tags a\n"), 3, "tag 'a' is given twice"},
+    {"tags of one constant", T("enum E" + std::string(kV1) + "\n  tags ab AB\n"), 3, "gives the same constant"},
+    // Members.
+    {"property twice", T(kData + Prop("p", "int") + Prop("p", "int")), 4, "member 'p' is declared twice"},
+    {"method and property of one name", T("managed M" + std::string(kV1) + "\n" + Method("p") + Prop("p", "int")), 4,
+     "member 'p' is declared twice"},
+    {"parameter twice", T("managed M" + std::string(kV1) + "\n" + Method("m") + "    param a int\n    param a int\n"), 5,
+     "parameter 'a' is declared twice"},
+    {"task wsdl name", T("managed M" + std::string(kV1) + "\n" + Method("m", " task")), 3, "must end in \"_Task\""},
+    {"throws a non-fault", T("managed M" + std::string(kV1) + "\n" + Method("m") + "    throws M\n"), 4, "'M' is not a fault"},
+    {"optional int by value", T("managed M" + std::string(kV1) + "\n" + Method("m") + "    param p int flags 2\n"), 4,
+     "an optional int cannot be passed by value"},
+    {"undeliverable result", T("managed M" + std::string(kV1) + "\n" + Method("m") + "    result double" + kV1 + "\n"), 4,
+     "cannot be delivered by a managed member"},
+    {"undeliverable property", T("managed M" + std::string(kV1) + "\n" + Prop("p", "int", 2)), 3,
+     "cannot be delivered by a managed member"},
+    {"property of a base", T(kData + Prop("p", "int") + "data E : D" + kV1 + "\n" + Prop("p", "int")), 5,
+     "already a property of a base"},
+    {"data accessors collide", T(kData + Prop("name", "string") + Prop("Name", "int")), 4,
+     "collide with those of 'name' at idl/tarn.t.idl:3"},
+    {"data accessor of the runtime", T(kData + Prop("refCount", "int")), 3, "'GetRefCount' of 'tarn.t.D' collides with the runtime's"},
+    {"managed members collide", T("managed M" + std::string(kV1) + "\n" + Method("getName") + Prop("name", "string", 4)), 4,
+     "GetName"},
+    {"inherited managed members collide",
+     T("managed A" + std::string(kV1) + "\n" + Method("run") + "managed B : A" + kV1 + "\n" + Method("Run")), 5,
+     "collides with the member at idl/tarn.t.idl:3"},
+    {"managed member of the runtime", T("managed M" + std::string(kV1) + "\n" + Prop("refCount", "int", 4)), 3,
+     "collides with the runtime's 'GetRefCount'"},
+    // Lines.
+    {"indented type line", T(kData + Prop("a", "int") + "  data E" + kV1 + "\n" + Prop("b", "int")), 4,
+     "indented among the members of 'D' (idl/tarn.t.idl:2)"},
+    {"flags past 7", T(kData + Prop("p", "int", 8)), 3, "from 0 to 7"},
+    {"property without flags", T(kData + "  property p int" + kV1 + "\n"), 3, "states its flags"},
+    {"unknown option", T("data D" + std::string(kV1) + " colour blue\n"), 2, "unexpected 'colour'"},
+    {"member outside a type", T("  param p int\n"), 2, "outside a method"},
+    {"method of a data object", T(kData + Method("m")), 3, "only a managed type has methods"},
+    {"second result", T("managed M" + std::string(kV1) + "\n" + Method("m") + "    result int" + kV1 + "\n    result int" + kV1 + "\n"),
+     5, "a method has one result"},
+};
+
+class CatalogueErrors : public ::testing::TestWithParam<Case> {};
+
+TEST_P(CatalogueErrors, NameTheirFileAndLine) {
+    const Case& c = GetParam();
+    CatalogueError e = Failure(c);
+    EXPECT_EQ(e.location.file, c.file) << e.what();
+    EXPECT_EQ(e.location.line, c.line) << e.what();
+    EXPECT_NE(std::string(e.what()).find(c.fragment), std::string::npos) << e.what();
+}
+
+INSTANTIATE_TEST_SUITE_P(Table, CatalogueErrors, ::testing::ValuesIn(kCases), [](const auto& info) {
+    std::string name = info.param.what;
+    for (char& ch : name)
+        if (!std::isalnum(static_cast<unsigned char>(ch))) ch = '_';
+    return name;
+});
+
+TEST(CatalogueWarnings, ATypeLineAmongMembersNamesBothLines) {
+    FileSyntax file = ParseFile("idl/tarn.t.idl", T(kData + Prop("a", "int") + "data E" + kV1 + "\n" + Prop("b", "int")));
+    ASSERT_EQ(file.warnings.size(), 1u);
+    EXPECT_EQ(file.warnings[0].rfind("idl/tarn.t.idl:4: warning:", 0), 0u) << file.warnings[0];
+    EXPECT_NE(file.warnings[0].find("members of 'D' (idl/tarn.t.idl:2)"), std::string::npos) << file.warnings[0];
+    EXPECT_TRUE(ParseFile("idl/tarn.t.idl", T(kData + Prop("a", "int") + "\ndata E" + kV1 + "\n" + Prop("b", "int"))).warnings.empty())
+        << "a blank line before a type line is the usual layout";
+}
+
+TEST(CatalogueErrors, AValidCatalogueResolves) {
+    Case c{"valid",
+           T("managed M" + std::string(kV1) + "\n" + Method("run", " wsdl Run") + "    param d D\n    result string version strata.version.version0\n" +
+             Prop("name", "string", 4) + "\n" + kData + Prop("items", "D", 3) + "\nenum M.Mode" + kV1 + "\n  tags a b\n"),
+           0, "accepted", ""};
+    EXPECT_STREQ(Failure(c).what(), ":0: accepted");
 }
 
 }  // namespace

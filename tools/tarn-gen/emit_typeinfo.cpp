@@ -14,19 +14,6 @@ namespace {
 
 std::string Quote(const std::string& s) { return "\"" + s + "\""; }
 std::string QuoteOrNull(const std::string& s) { return s.empty() ? "nullptr" : Quote(s); }
-std::string Hex(std::uint32_t kind) {
-    const char* digits = "0123456789ABCDEF";
-    return std::string("0x") + digits[(kind >> 4) & 15] + digits[kind & 15];
-}
-std::uint32_t KindCode(Kind kind) {
-    switch (kind) {
-    case Kind::Enum: return 0x0F;
-    case Kind::Data: return 0x10;
-    case Kind::Fault: return 0x11;
-    case Kind::Managed: return 0x12;
-    }
-    return 0;
-}
 
 // Internal symbols of one type's records: "kTarnCnxmgrConnectionState" + suffix.
 std::string Local(const Type& t, const char* suffix) { return "k" + t.flatName + suffix; }
@@ -41,7 +28,7 @@ public:
         _out.Raw("\n// Header records.\n");
         for (const Type* t : _unit.types)
             _out.Print("constinit const Orbit::TypeInfo $record$ = {$kind$, $wire$, $flat$, $version$};\n",
-                       {{"record", t->record}, {"kind", Hex(KindCode(t->kind))}, {"wire", Quote(t->wireName)},
+                       {{"record", t->record}, {"kind", KindExpression(t->kind)}, {"wire", Quote(t->wireName)},
                         {"flat", Quote(t->flatName)}, {"version", Quote(t->version)}});
         bool managed = false;
         for (const Type* t : _unit.types) managed = managed || t->kind == Kind::Managed;
@@ -97,7 +84,7 @@ private:
         for (const Property& p : t.properties)
             _out.Print("    {$name$, $privilege$, 0, $type$, $flags$, $version$},\n",
                        {{"name", Quote(p.name)}, {"privilege", QuoteOrNull(p.privilege)}, {"type", p.type.RecordAddress()},
-                        {"flags", std::to_string(p.flags)}, {"version", Quote(p.version)}});
+                        {"flags", FlagsExpression(p.flags)}, {"version", Quote(p.version)}});
         _out.Raw("    {nullptr, nullptr, 0, nullptr, Orbit::Flag::End, nullptr},\n};\n");
     }
 
@@ -266,10 +253,10 @@ private:
             _out.Print("    {$name$, $wsdl$, $privilege$, 0, {\"result\", 0, $rtype$, $rflags$, $rversion$}, $params$, $faults$, $flags$, $version$},\n",
                        {{"name", Quote(m.name)}, {"wsdl", Quote(m.wsdlName)}, {"privilege", QuoteOrNull(m.privilege)},
                         {"rtype", m.hasResult ? m.result.type.RecordAddress() : "nullptr"},
-                        {"rflags", std::to_string(m.hasResult ? m.result.flags : 0)}, {"rversion", Quote(m.result.version)},
+                        {"rflags", FlagsExpression(m.hasResult ? m.result.flags : 0)}, {"rversion", Quote(m.result.version)},
                         {"params", m.params.empty() ? "kNoParams" : prefix + "Params"},
                         {"faults", m.faults.empty() ? "kNoFaults" : prefix + "Faults"},
-                        {"flags", m.task ? "1" : "0"}, {"version", Quote(m.version)}});
+                        {"flags", MethodFlagsExpression(m.task)}, {"version", Quote(m.version)}});
         }
         _out.Raw("    {nullptr, nullptr, nullptr, 0, {nullptr, 0, nullptr, 0, nullptr}, nullptr, nullptr, 0, nullptr},\n};\n");
         PropertyList(t);
@@ -292,7 +279,7 @@ private:
             _out.Print("constinit const Orbit::ParamInfo $list$[] = {\n", {{"list", prefix + "Params"}});
             for (const Param& p : m.params)
                 _out.Print("    {$name$, 0, $type$, $flags$, $version$},\n",
-                           {{"name", Quote(p.name)}, {"type", p.type.RecordAddress()}, {"flags", std::to_string(p.flags)},
+                           {{"name", Quote(p.name)}, {"type", p.type.RecordAddress()}, {"flags", FlagsExpression(p.flags)},
                             {"version", Quote(p.version)}});
             _out.Raw("    {nullptr, 0, nullptr, Orbit::Flag::End, nullptr},\n};\n");
         }

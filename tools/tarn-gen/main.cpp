@@ -1,13 +1,18 @@
 // tarn-gen: reads the catalogue and writes the generated sources of the library.
 //
-//   tarn-gen --idl <catalogue dir> --out <output dir>
+//   tarn-gen --idl <catalogue dir> --out <output dir> [--list <file>]
 //
 // Every *.idl file below the catalogue directory is read. An output file is
 // rewritten only when its content changes, so unchanged sources do not rebuild.
+// With --list nothing is generated: the file gets, as CMake variables, the
+// catalogue files read and the files a run would write, by library (see
+// tools/tarn-gen/generate.cmake), so that the build never restates their names.
 #include <algorithm>
 #include <filesystem>
 #include <fstream>
+#include <functional>
 #include <iostream>
+#include <map>
 #include <sstream>
 
 #include "emit.h"
@@ -40,18 +45,63 @@ void WriteIfChanged(const fs::path& path, const std::string& text) {
 }
 
 int Usage() {
-    std::cerr << "usage: tarn-gen --idl <catalogue dir> --out <output dir>\n";
+    std::cerr << "usage: tarn-gen --idl <catalogue dir> --out <output dir> [--list <file>]\n";
     return 2;
+}
+
+// One generated file and the library it is compiled into ("" for headers).
+struct Output {
+    std::string path;  // below the output directory
+    std::string library;
+    std::function<std::string()> text;
+};
+
+std::vector<Output> Outputs(const tarngen::Model& model) {
+    using namespace tarngen;
+    std::vector<Output> out;
+    for (const auto& owned : model.units) {
+        const Unit* unit = owned.get();
+        std::string library = unit->standin ? "STANDINS" : "TYPES";
+        out.push_back({unit->header, "", [&model, unit] { return EmitHeader(model, *unit); }});
+        out.push_back({unit->outputDir + "/typeinfo.cpp", library, [&model, unit] { return EmitTypeinfo(model, *unit); }});
+        out.push_back({unit->outputDir + "/stub.cpp", library, [&model, unit] { return EmitStub(model, *unit); }});
+        if (unit->standin) continue;
+        out.push_back({DoublesHeaderPath(*unit), "", [&model, unit] { return EmitDoublesHeader(model, *unit); }});
+        out.push_back({unit->outputDir + "/doubles.cpp", "TESTING", [&model, unit] { return EmitDoubles(model, *unit); }});
+    }
+    out.push_back({"tarn/testing.h", "", [&model] { return EmitDoublesUmbrella(model); }});
+    out.push_back({"tarn/versions.h", "", [&model] { return EmitVersionsHeader(model); }});
+    out.push_back({"tarn/versions.cpp", "TYPES", [&model] { return EmitVersions(model); }});
+    out.push_back({"tarn/types.h", "", [&model] { return EmitUmbrella(model); }});
+    return out;
+}
+
+std::string ListFile(const std::vector<fs::path>& inputs, const fs::path& dir, const std::vector<Output>& outputs) {
+    std::map<std::string, std::string> lists;
+    for (const fs::path& input : inputs) lists["INPUTS"] += fs::absolute(input).generic_string() + ";";
+    for (const Output& o : outputs) {
+        std::string path = (dir / o.path).generic_string() + ";";
+        lists["OUTPUTS"] += path;
+        if (!o.library.empty()) lists[o.library + "_SOURCES"] += path;
+    }
+    std::string text = "# Written by tarn-gen --list. Do not edit.\n";
+    for (const char* name : {"INPUTS", "OUTPUTS", "TYPES_SOURCES", "STANDINS_SOURCES", "TESTING_SOURCES"}) {
+        std::string list = lists[name];
+        if (!list.empty()) list.pop_back();
+        text += std::string("set(TARN_GEN_") + name + " \"" + list + "\")\n";
+    }
+    return text;
 }
 
 }  // namespace
 
 int main(int argc, char** argv) {
-    fs::path idl, out;
+    fs::path idl, out, list;
     for (int i = 1; i < argc; ++i) {
         std::string arg = argv[i];
         if (arg == "--idl" && i + 1 < argc) idl = argv[++i];
         else if (arg == "--out" && i + 1 < argc) out = argv[++i];
+        else if (arg == "--list" && i + 1 < argc) list = argv[++i];
         else return Usage();
     }
     if (idl.empty() || out.empty()) return Usage();
@@ -68,20 +118,15 @@ int main(int argc, char** argv) {
         for (const fs::path& path : paths) {
             std::string display = fs::absolute(path).lexically_normal().lexically_relative(shown).generic_string();
             files.push_back(tarngen::ParseFile(display, ReadFile(path)));
+            for (const std::string& warning : files.back().warnings) std::cerr << warning << "\n";
         }
         tarngen::Model model = tarngen::Resolve(std::move(files));
-        for (const auto& unit : model.units) {
-            WriteIfChanged(out / unit->header, tarngen::EmitHeader(model, *unit));
-            WriteIfChanged(out / unit->outputDir / "typeinfo.cpp", tarngen::EmitTypeinfo(model, *unit));
-            WriteIfChanged(out / unit->outputDir / "stub.cpp", tarngen::EmitStub(model, *unit));
-            if (unit->standin) continue;
-            WriteIfChanged(out / tarngen::DoublesHeaderPath(*unit), tarngen::EmitDoublesHeader(model, *unit));
-            WriteIfChanged(out / unit->outputDir / "doubles.cpp", tarngen::EmitDoubles(model, *unit));
+        std::vector<Output> outputs = Outputs(model);
+        if (!list.empty()) {
+            WriteIfChanged(list, ListFile(paths, fs::absolute(out).lexically_normal(), outputs));
+            return 0;
         }
-        WriteIfChanged(out / "tarn/testing.h", tarngen::EmitDoublesUmbrella(model));
-        WriteIfChanged(out / "tarn/versions.h", tarngen::EmitVersionsHeader(model));
-        WriteIfChanged(out / "tarn/versions.cpp", tarngen::EmitVersions(model));
-        WriteIfChanged(out / "tarn/types.h", tarngen::EmitUmbrella(model));
+        for (const Output& o : outputs) WriteIfChanged(out / o.path, o.text());
     } catch (const tarngen::CatalogueError& e) {
         std::cerr << e.what() << "\n";
         return 1;

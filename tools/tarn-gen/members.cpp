@@ -24,7 +24,7 @@ MemberParam ParamOf(const Param& p) {
 
 // How a value of `type` with `flags` comes back from a member.
 void Deliver(Member& m, const TypeRef& type, std::uint32_t flags) {
-    if (flags & 1) {
+    if (flags & Orbit::Flag::Array) {
         m.delivery = Delivery::RefOut;
         m.resultType = type.ArrayClass();
     } else if (type.IsObject()) {

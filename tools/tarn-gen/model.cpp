@@ -10,19 +10,6 @@
 namespace tarngen {
 namespace {
 
-constexpr std::uint32_t kArray = 1;
-constexpr std::uint32_t kOptional = 2;
-
-Kind KindOf(TypeKind kind) {
-    switch (kind) {
-    case TypeKind::Data: return Kind::Data;
-    case TypeKind::Fault: return Kind::Fault;
-    case TypeKind::Managed: return Kind::Managed;
-    case TypeKind::Enum: return Kind::Enum;
-    }
-    return Kind::Data;
-}
-
 const char* KindWord(Kind kind) {
     switch (kind) {
     case Kind::Data: return "data object";
@@ -50,26 +37,22 @@ public:
     }
 
 private:
-    // The runtime's roots and records; catalogued types may name them but not redeclare them.
+    // The runtime's own types that a catalogue may name but not redeclare, from the
+    // runtime's table; primitives are keywords instead (see Primitives()).
     void AddRuntimeTypes() {
-        struct Row { const char* wire; Kind kind; const char* cls; const char* record; };
-        const Row rows[] = {
-            {"strata.DynamicData", Kind::Data, "Orbit::DynamicData", "gStrataDynamicDataTypeInfo"},
-            {"strata.KeyAnyValue", Kind::Data, "Orbit::KeyAnyValue", "gStrataKeyAnyValueTypeInfo"},
-            {"strata.MethodFault", Kind::Fault, "Orbit::MethodFault", "Orbit::gStrataMethodFaultTypeInfo"},
-            {"strata.ManagedObject", Kind::Managed, "Orbit::ManagedObject", "Orbit::gStrataManagedObjectTypeInfo"},
-        };
-        for (const Row& row : rows) {
+        for (const Orbit::RuntimeRecord& row : Orbit::kRuntimeRecords) {
+            if (row.kind == Orbit::Kind::Primitive) continue;
             auto type = std::make_unique<Type>();
-            type->kind = row.kind;
+            type->kind = static_cast<Kind>(row.kind);
             type->runtime = true;
-            type->wireName = row.wire;
-            type->name = names::Segments(row.wire).back();
-            type->flatName = names::Flat(row.wire);
-            type->className = row.cls;
-            type->record = row.record;
-            type->version = "strata.version.version0";
-            _model.byWireName[row.wire] = type.get();
+            type->wireName = row.wireName;
+            type->name = names::Segments(row.wireName).back();
+            type->flatName = row.symbol;
+            type->className = "Orbit::" + type->name;
+            type->record = names::RuntimeRecord(row.symbol);
+            type->version = Orbit::kNoneVersion;
+            if (row.root) _roots[type->kind] = type.get();
+            _model.byWireName[row.wireName] = type.get();
             _model.types.push_back(std::move(type));
         }
     }
@@ -175,7 +158,7 @@ private:
         for (TypeSyntax& syntax : file.types) {
             auto type = std::make_unique<Type>();
             type->where = syntax.where;
-            type->kind = KindOf(syntax.kind);
+            type->kind = syntax.kind;
             type->unit = unit;
             type->wireName = syntax.ns + "." + syntax.name;
             type->name = names::Segments(syntax.name).back();
@@ -211,8 +194,8 @@ private:
             if (p.keyword == name) ref.primitive = &p;
         if (!ref.primitive) ref.type = FindType(ns, name);
         if (!ref.primitive && !ref.type) throw CatalogueError(where, "unknown type '" + name + "'");
-        if (ref.type && ref.type->wireName == "strata.DynamicData")
-            throw CatalogueError(where, "'strata.DynamicData' is a base, not a value type");
+        if (ref.type && ref.type == _roots.at(Kind::Data))
+            throw CatalogueError(where, "'" + ref.type->wireName + "' is a base, not a value type");
         return ref;
     }
 
@@ -230,9 +213,7 @@ private:
         }
         // Base.
         if (type.kind != Kind::Enum) {
-            static const char* roots[] = {"strata.DynamicData", "strata.MethodFault", "strata.ManagedObject"};
-            const char* root = roots[type.kind == Kind::Data ? 0 : type.kind == Kind::Fault ? 1 : 2];
-            std::string baseName = syntax.base ? *syntax.base : root;
+            std::string baseName = syntax.base ? *syntax.base : _roots.at(type.kind)->wireName;
             const Type* base = FindType(ns, baseName);
             if (!base) throw CatalogueError(syntax.where, "unknown base '" + baseName + "'");
             if (base->kind != type.kind || base == &type)
@@ -307,7 +288,7 @@ private:
             CheckVersion(m.result->where, m.result->version);
             if (!m.task) CheckDelivered(m.result->where, method.result.type, m.result->flags, "result");
         } else {
-            method.result.version = "strata.version.version0";
+            method.result.version = Orbit::kNoneVersion;
         }
         if (m.task && !method.wsdlName.ends_with("_Task"))
             throw CatalogueError(m.where, "the wsdl name of task method '" + m.name + "' must end in \"_Task\"");
@@ -322,7 +303,7 @@ private:
     // Parameters: values by value (not optional, not arrays of anything but
     // strings and ints), objects and arrays by pointer.
     void CheckParameter(const Param& p) {
-        bool array = p.flags & kArray, optional = p.flags & kOptional;
+        bool array = p.flags & Orbit::Flag::Array, optional = p.flags & Orbit::Flag::Optional;
         if (p.type.IsObject() || array) return;
         if (optional) throw CatalogueError(p.where, "parameter '" + p.name + "': an optional " + p.type.DisplayName() + " cannot be passed by value");
     }
@@ -330,7 +311,7 @@ private:
     // How a managed member hands back a value: by value for required strings and
     // integers and booleans, through a Ref parameter for objects and arrays.
     void CheckDelivered(const Location& where, const TypeRef& type, std::uint32_t flags, const char* what) {
-        bool array = flags & kArray, optional = flags & kOptional;
+        bool array = flags & Orbit::Flag::Array, optional = flags & Orbit::Flag::Optional;
         if (array || type.IsObject()) return;
         if (optional || !type.primitive || !type.primitive->byValueResult)
             throw CatalogueError(where, std::string("a ") + what + " of type " + type.DisplayName() + " with flags " +
@@ -341,25 +322,36 @@ private:
         std::set<const Type*> seen;
         for (const Type* t = &type; t; t = t->base)
             if (!seen.insert(t).second) throw CatalogueError(syntax.where, "the base chain of '" + type.wireName + "' is a cycle");
-        // A data object's accessors must not collide with those of its bases.
+        // A data object's accessors share one class scope with those of its bases and the runtime's.
         if (type.IsDataLike()) {
-            std::set<std::string> names;
-            for (const Property* p : type.ChainProperties())
-                if (!names.insert(p->name).second)
+            std::map<std::string, const Property*> getters;
+            for (const Property* p : type.ChainProperties()) {
+                auto [it, fresh] = getters.emplace(names::Accessor("Get", p->name), p);
+                if (!fresh && it->second->name == p->name)
                     throw CatalogueError(p->where, "property '" + p->name + "' is already a property of a base of '" + type.wireName + "'");
+                if (!fresh)
+                    throw CatalogueError(p->where, "the accessors of property '" + p->name + "' of '" + type.wireName +
+                                                       "' collide with those of '" + it->second->name + "' at " + it->second->where.ToString());
+                for (const char* prefix : {"Get", "Set"})
+                    if (kReserved.count(names::Accessor(prefix, p->name)))
+                        throw CatalogueError(p->where, "accessor '" + names::Accessor(prefix, p->name) + "' of '" + type.wireName +
+                                                           "' collides with the runtime's");
+            }
         }
     }
 
+    // Names the runtime's base classes already give every object.
+    inline static const std::set<std::string> kReserved = {"IncRef", "DecRef", "ToString", "GetRefCount", "_GetType", "_GetRef", "_Unregistered"};
+
     // Getters and operations of an interface and of its bases share one scope.
     void CheckMemberNames(const Type& type) {
-        static const std::set<std::string> reserved = {"IncRef", "DecRef", "ToString", "GetRefCount", "_GetType", "_GetRef", "_Unregistered"};
         std::map<std::string, Location> taken;
         std::vector<const Type*> chain;  // root-most first, so a clash is reported at the derived member
         for (const Type* t = &type; t && !t->runtime; t = t->base) chain.insert(chain.begin(), t);
         for (const Type* t : chain) {
-            for (const Method& m : t->methods) Claim(taken, reserved, m.operation, m.where, type);
+            for (const Method& m : t->methods) Claim(taken, kReserved, m.operation, m.where, type);
             for (const Property& p : t->properties)
-                Claim(taken, reserved, names::Accessor(IsBoolean(p.type) && !p.IsArray() ? "Is" : "Get", p.name), p.where, type);
+                Claim(taken, kReserved, names::Accessor(IsBoolean(p.type) && !p.IsArray() ? "Is" : "Get", p.name), p.where, type);
         }
     }
 
@@ -376,6 +368,7 @@ private:
     std::map<std::string, int> _versionIndex;
     std::vector<const VersionSyntax*> _versionIncludes;
     std::map<std::string, int> _loadOrder;
+    std::map<Kind, const Type*> _roots;
     std::vector<std::pair<Type*, const TypeSyntax*>> _declared;
 };
 

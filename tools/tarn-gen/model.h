@@ -20,7 +20,7 @@ struct Primitive {
     std::string keyword;     // "string"
     std::string cppType;     // "std::string"
     std::string paramType;   // "const std::string&"
-    std::string record;      // "Orbit::gStringTypeInfo"
+    std::string record;      // "Orbit::gStringTypeInfo", from the runtime's table
     bool isObject;           // anyType is held by reference, the others by value
     bool byValueResult;      // may be returned by value from a managed member
 };
@@ -56,8 +56,8 @@ struct Property {
     int index = 0;          // in the owner's own property list
     int memberNumber = 0;   // managed types: methods first, then properties
 
-    bool IsArray() const { return (flags & 1) != 0; }
-    bool IsOptional() const { return (flags & 2) != 0; }
+    bool IsArray() const { return (flags & Orbit::Flag::Array) != 0; }
+    bool IsOptional() const { return (flags & Orbit::Flag::Optional) != 0; }
 };
 
 struct Param {
@@ -66,7 +66,7 @@ struct Param {
     TypeRef type;
     std::uint32_t flags = 0;
     std::string version;
-    bool IsArray() const { return (flags & 1) != 0; }
+    bool IsArray() const { return (flags & Orbit::Flag::Array) != 0; }
 };
 
 struct Method {
@@ -83,8 +83,6 @@ struct Method {
     std::vector<const Type*> faults;
     int memberNumber = 0;
 };
-
-enum class Kind { Data, Fault, Managed, Enum };
 
 struct Type {
     Location where;
@@ -159,5 +157,11 @@ Model Resolve(std::vector<FileSyntax> files);
 
 // The primitive table.
 const std::vector<Primitive>& Primitives();
+
+// How generated code spells a kind, property flags and method flags:
+// "Orbit::Kind::Data", "Orbit::Flag::Array | Orbit::Flag::Optional", "0".
+std::string KindExpression(Kind kind);
+std::string FlagsExpression(std::uint32_t flags);
+std::string MethodFlagsExpression(bool task);
 
 }  // namespace tarngen

@@ -42,6 +42,8 @@ std::string ClassPath(const std::string& wireName) {
 
 std::string Record(const std::string& wireName) { return "g" + Flat(wireName) + "TypeInfo"; }
 
+std::string RuntimeRecord(const std::string& symbol) { return "Orbit::g" + symbol + "TypeInfo"; }
+
 std::string MethodObjects(const std::string& wireName) { return "g" + Flat(wireName) + "MethodObjects"; }
 
 std::string Loader(const std::string& unitName) { return Flat(unitName) + "TypeinfoTypeInfoLoader"; }

@@ -18,6 +18,8 @@ std::string Flat(const std::string& wireName);
 std::string ClassPath(const std::string& wireName);
 // "tarn.cnxmgr.ConnectionState" -> "gTarnCnxmgrConnectionStateTypeInfo"
 std::string Record(const std::string& wireName);
+// A row of the runtime's records by its symbol: "String" -> "Orbit::gStringTypeInfo"
+std::string RuntimeRecord(const std::string& symbol);
 // "tarn.AlertManager" -> "gTarnAlertManagerMethodObjects"
 std::string MethodObjects(const std::string& wireName);
 // "tarn.cnxmgr" -> "TarnCnxmgrTypeinfoTypeInfoLoader"; "tarn" -> "TarnTypeinfoTypeInfoLoader"

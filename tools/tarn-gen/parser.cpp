@@ -35,9 +35,11 @@ bool IsIdentifier(const std::string& word, bool dotted) {
 // "key value" pairs and bare switches, each at most once.
 class Statement {
 public:
-    Statement(Location where, std::vector<std::string> words) : _where(std::move(where)), _words(std::move(words)) {}
+    Statement(Location where, std::vector<std::string> words, bool indented)
+        : _where(std::move(where)), _words(std::move(words)), _indented(indented) {}
 
     const Location& Where() const { return _where; }
+    bool Indented() const { return _indented; }
     const std::string& Keyword() const { return _words[0]; }
 
     std::string Positional(const char* what, bool dotted = true) {
@@ -106,13 +108,23 @@ private:
     std::map<std::string, std::string> _values;
     std::set<std::string> _switches;
     std::vector<std::string> _rest;
+    bool _indented;
 };
 
-constexpr std::uint32_t kMaxFlags = 7;
+constexpr std::uint32_t kMaxFlags = Orbit::Flag::All;
 
 class Parser {
 public:
     Parser(const std::string& path) { _file.path = path; }
+
+    // A type line directly between member lines of one indentation looks pasted there:
+    // the members below it silently change owner. Said, not refused.
+    void WarnIfAmongMembers(const Statement& s, int before, int after) {
+        if (before <= 0 || before != after || _file.types.empty()) return;
+        const TypeSyntax& above = _file.types.back();
+        _file.warnings.push_back(s.Where().ToString() + ": warning: type line among the members of '" + above.name +
+                                 "' (" + above.where.ToString() + "); the member lines below it now belong to it");
+    }
 
     void Line(Statement s) {
         const std::string& keyword = s.Keyword();
@@ -121,10 +133,10 @@ public:
         if (keyword == "version") return Version(s);
         if (keyword == "loaders") return Loaders(s);
         if (_file.unit.empty()) s.Fail("the file must start with 'namespace', 'standin' or 'version'");
-        if (keyword == "data") return Type(s, TypeKind::Data);
-        if (keyword == "fault") return Type(s, TypeKind::Fault);
-        if (keyword == "managed") return Type(s, TypeKind::Managed);
-        if (keyword == "enum") return Type(s, TypeKind::Enum);
+        if (keyword == "data") return Type(s, Kind::Data);
+        if (keyword == "fault") return Type(s, Kind::Fault);
+        if (keyword == "managed") return Type(s, Kind::Managed);
+        if (keyword == "enum") return Type(s, Kind::Enum);
         if (keyword == "property") return Property(s);
         if (keyword == "tags") return Tags(s);
         if (keyword == "method") return Method(s);
@@ -179,8 +191,13 @@ private:
         if (_file.loaders.empty()) s.Fail("'loaders' needs at least one namespace");
     }
 
-    void Type(Statement& s, TypeKind kind) {
+    void Type(Statement& s, Kind kind) {
         if (_ns.empty()) s.Fail("a stand-in file needs a 'namespace' before its types");
+        // An indented type line reads as one more member of the type above, yet takes
+        // every member line below it.
+        if (s.Indented() && !_file.types.empty())
+            s.Fail("type line indented among the members of '" + _file.types.back().name + "' (" +
+                   _file.types.back().where.ToString() + "); a type line starts at the left margin");
         TypeSyntax t;
         t.where = s.Where();
         t.kind = kind;
@@ -188,7 +205,7 @@ private:
         t.name = s.Positional("type name");
         s.Options({"version", ":"});
         if (auto base = s.Value(":")) {
-            if (kind == TypeKind::Enum) s.Fail("an enumeration has no base");
+            if (kind == Kind::Enum) s.Fail("an enumeration has no base");
             if (!IsIdentifier(*base, true)) s.Fail("bad base '" + *base + "'");
             t.base = *base;
         }
@@ -204,7 +221,7 @@ private:
 
     void Property(Statement& s) {
         TypeSyntax& t = CurrentType(s, "property");
-        if (t.kind == TypeKind::Enum) s.Fail("an enumeration has tags, not properties");
+        if (t.kind == Kind::Enum) s.Fail("an enumeration has tags, not properties");
         PropertySyntax p;
         p.where = s.Where();
         p.name = s.Positional("property name", false);
@@ -220,7 +237,7 @@ private:
 
     void Tags(Statement& s) {
         TypeSyntax& t = CurrentType(s, "tags");
-        if (t.kind != TypeKind::Enum) s.Fail("only an enumeration has tags");
+        if (t.kind != Kind::Enum) s.Fail("only an enumeration has tags");
         std::vector<std::string> tags = s.Remaining();
         if (tags.empty()) s.Fail("'tags' needs at least one tag");
         for (const std::string& tag : tags) {
@@ -232,7 +249,7 @@ private:
 
     void Method(Statement& s) {
         TypeSyntax& t = CurrentType(s, "method");
-        if (t.kind != TypeKind::Managed) s.Fail("only a managed type has methods");
+        if (t.kind != Kind::Managed) s.Fail("only a managed type has methods");
         MethodSyntax m;
         m.where = s.Where();
         m.name = s.Positional("method name", false);
@@ -291,11 +308,20 @@ private:
 FileSyntax ParseFile(const std::string& path, const std::string& text) {
     Parser parser(path);
     std::istringstream in(text);
-    std::string line;
-    for (int number = 1; std::getline(in, line); ++number) {
-        std::vector<std::string> words = SplitWords(line);
+    std::vector<std::string> lines;
+    for (std::string line; std::getline(in, line);) lines.push_back(line);
+    // Indentation of each statement line; -1 for a line without a statement.
+    std::vector<int> indent(lines.size(), -1);
+    for (std::size_t i = 0; i < lines.size(); ++i)
+        if (!SplitWords(lines[i]).empty()) indent[i] = static_cast<int>(lines[i].find_first_not_of(" \t"));
+    for (std::size_t i = 0; i < lines.size(); ++i) {
+        std::vector<std::string> words = SplitWords(lines[i]);
         if (words.empty()) continue;
-        parser.Line(Statement(Location{path, number}, std::move(words)));
+        Statement statement(Location{path, static_cast<int>(i) + 1}, std::move(words), indent[i] > 0);
+        static const std::set<std::string> typeWords = {"data", "fault", "managed", "enum"};
+        if (indent[i] == 0 && typeWords.count(statement.Keyword()) && i > 0 && i + 1 < lines.size())
+            parser.WarnIfAmongMembers(statement, indent[i - 1], indent[i + 1]);
+        parser.Line(std::move(statement));
     }
     return parser.Finish();
 }

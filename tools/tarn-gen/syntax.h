@@ -7,6 +7,8 @@
 #include <string>
 #include <vector>
 
+#include "orbit/Records.h"
+
 namespace tarngen {
 
 // A position in a catalogue file, for messages.
@@ -60,11 +62,17 @@ struct PropertySyntax {
     std::optional<std::string> privilege;
 };
 
-enum class TypeKind { Data, Fault, Managed, Enum };
+// The kinds a catalogue declares, valued as the runtime's records spell them.
+enum class Kind : std::uint32_t {
+    Data = Orbit::Kind::Data,
+    Fault = Orbit::Kind::Fault,
+    Managed = Orbit::Kind::Managed,
+    Enum = Orbit::Kind::Enum,
+};
 
 struct TypeSyntax {
     Location where;
-    TypeKind kind = TypeKind::Data;
+    Kind kind = Kind::Data;
     std::string ns;    // the namespace in force where it was declared
     std::string name;  // relative to ns, dotted when nested
     std::optional<std::string> base;
@@ -93,6 +101,7 @@ struct FileSyntax {
     std::vector<VersionSyntax> versions;
     std::vector<std::string> loaders;
     Location loadersWhere;
+    std::vector<std::string> warnings;  // "file:line: warning: ..."
 };
 
 // Parses one file; throws CatalogueError on the first malformed line.

@@ -35,8 +35,27 @@ namespace Flag {
 inline constexpr std::uint32_t Array = 1;
 inline constexpr std::uint32_t Optional = 2;
 inline constexpr std::uint32_t Carried = 4;      // meaningful to the runtime only
+inline constexpr std::uint32_t All = Array | Optional | Carried;
 inline constexpr std::uint32_t End = 0xFFFFFFFF;  // list terminator
 }  // namespace Flag
+
+// Flag bits of methods.
+namespace MethodFlag {
+inline constexpr std::uint32_t Task = 1;
+}  // namespace MethodFlag
+
+// A constant's value and its name as generated code spells it ("Orbit::Kind::" + name).
+struct NamedValue {
+    std::uint32_t value;
+    const char* name;
+};
+inline constexpr NamedValue kKindNames[] = {{Kind::Primitive, "Primitive"}, {Kind::Array, "Array"}, {Kind::Enum, "Enum"},
+                                            {Kind::Data, "Data"},           {Kind::Fault, "Fault"}, {Kind::Managed, "Managed"}};
+inline constexpr NamedValue kFlagNames[] = {{Flag::Array, "Array"}, {Flag::Optional, "Optional"}, {Flag::Carried, "Carried"}};
+
+// The version that means "none": the runtime's own records carry it, and so does the
+// result of a method that returns nothing.
+inline constexpr const char* kNoneVersion = "strata.version.version0";
 
 // The header record of a type, exported as g<flat name>TypeInfo.
 struct TypeInfo {
@@ -72,7 +91,7 @@ struct MethodInfo {
     ParamInfo result;
     const ParamInfo* params;
     const TypeInfo* const* faults;  // null-terminated
-    std::uint32_t flags;            // 1: task method
+    std::uint32_t flags;            // MethodFlag bits
     const char* version;
 };
 
@@ -132,20 +151,41 @@ struct EnumTypeInfo {
 template <class T>
 struct RecordAccess;
 
-// Records of the runtime's own types.
-extern const TypeInfo gStringTypeInfo;      // "string", flat "String"
-extern const TypeInfo gBoolTypeInfo;        // "boolean", flat "Bool"
-extern const TypeInfo gIntTypeInfo;         // "int", flat "Int"
-extern const TypeInfo gLongTypeInfo;        // "long", flat "Long"
-extern const TypeInfo gDoubleTypeInfo;      // "double", flat "Double"
-extern const TypeInfo gDateTimeTypeInfo;    // "dateTime", flat "DateTime"
-extern const TypeInfo gAnyTypeInfo;         // "anyType", flat "Any"
-extern const TypeInfo gMethodNameTypeInfo;  // "methodName", flat "MethodName"
-extern const TypeInfo gMoRefTypeInfo;       // "ManagedObjectReference", flat "MoRef"
-extern const TypeInfo gStrataManagedObjectTypeInfo;  // "strata.ManagedObject"
-extern const TypeInfo gStrataMethodFaultTypeInfo;    // "strata.MethodFault"
+// The runtime's own records, one row each: X(symbol, wire name, kind, root). The record
+// is Orbit::g<symbol>TypeInfo and its flat name is <symbol>. A catalogue names a
+// primitive by its wire name; a catalogued type that names no base derives from the
+// root row of its kind, whose class is Orbit::<last segment of the wire name>.
+#define ORBIT_RUNTIME_RECORDS(X)                                \
+    X(String, "string", Primitive, false)                       \
+    X(Bool, "boolean", Primitive, false)                        \
+    X(Int, "int", Primitive, false)                             \
+    X(Long, "long", Primitive, false)                           \
+    X(Double, "double", Primitive, false)                       \
+    X(DateTime, "dateTime", Primitive, false)                   \
+    X(Any, "anyType", Primitive, false)                         \
+    X(MethodName, "methodName", Primitive, false)               \
+    X(MoRef, "ManagedObjectReference", Primitive, false)        \
+    X(StrataManagedObject, "strata.ManagedObject", Managed, true) \
+    X(StrataMethodFault, "strata.MethodFault", Fault, true)     \
+    X(StrataDynamicData, "strata.DynamicData", Data, true)      \
+    X(StrataKeyAnyValue, "strata.KeyAnyValue", Data, false)
+
+#define ORBIT_DECLARE_RECORD(symbol, wire, kind, root) extern const TypeInfo g##symbol##TypeInfo;
+ORBIT_RUNTIME_RECORDS(ORBIT_DECLARE_RECORD)
+#undef ORBIT_DECLARE_RECORD
+
+struct RuntimeRecord {
+    const char* symbol;
+    const char* wireName;
+    std::uint32_t kind;
+    bool root;
+};
+#define ORBIT_RECORD_ROW(symbol, wire, kind, root) {#symbol, wire, Kind::kind, root},
+inline constexpr RuntimeRecord kRuntimeRecords[] = {ORBIT_RUNTIME_RECORDS(ORBIT_RECORD_ROW)};
+#undef ORBIT_RECORD_ROW
 
 }  // namespace Orbit
 
-extern const Orbit::TypeInfo gStrataDynamicDataTypeInfo;  // "strata.DynamicData"
-extern const Orbit::TypeInfo gStrataKeyAnyValueTypeInfo;  // "strata.KeyAnyValue"
+// Older spellings of the two data roots, from before they joined the table above.
+using Orbit::gStrataDynamicDataTypeInfo;
+using Orbit::gStrataKeyAnyValueTypeInfo;
