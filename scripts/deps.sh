@@ -2,6 +2,7 @@
 # Installs what the build needs on Debian 12 (run as root). Does nothing when all is there.
 set -euo pipefail
 packages=(g++ cmake ninja-build libboost-dev libgtest-dev libgmock-dev libbenchmark-dev
+          nlohmann-json3-dev  # the tests read tarn-catalog's JSON with it
           libprotobuf-dev protobuf-compiler  # the benchmarks' side-by-side twin
           clang-14 libclang-rt-14-dev)  # clang and its libFuzzer, for the fuzz preset
 missing=()

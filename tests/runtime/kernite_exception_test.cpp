@@ -2,7 +2,7 @@
 
 #include <memory>
 
-#include "expect.h"
+#include "support.h"
 #include "kernite/Kernite.h"
 
 using TestSupport::MessageOf;

@@ -3,7 +3,7 @@
 #include <thread>
 #include <vector>
 
-#include "expect.h"
+#include "support.h"
 #include "kernite/Kernite.h"
 
 using Kernite::ObjectImpl;

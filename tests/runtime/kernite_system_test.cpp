@@ -3,7 +3,7 @@
 #include <chrono>
 #include <thread>
 
-#include "expect.h"
+#include "support.h"
 #include "kernite/Kernite.h"
 
 using Kernite::System::DateTime;

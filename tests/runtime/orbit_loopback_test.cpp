@@ -4,7 +4,6 @@
 #include <memory>
 #include <mutex>
 
-#include "expect.h"
 #include "fixtures.h"
 
 using Kernite::ObjectImpl;
@@ -13,10 +12,10 @@ using Kernite::System::ScheduledItem;
 using Orbit::Any;
 using Orbit::LoopbackAdapter;
 using Orbit::MethodFault;
-using Sample::BadRequest;
-using Sample::Calculator;
-using Sample::CalculatorImpl;
-using Sample::CalculatorStub;
+using Fix::BadRequest;
+using Fix::Calculator;
+using Fix::CalculatorStub;
+using Fixture::CalculatorImpl;
 
 namespace {
 
@@ -41,11 +40,10 @@ struct Completion {
     }
 };
 
-class LoopbackTest : public ::testing::Test {
+class LoopbackTest : public Fixture::NoLeakTest {
 protected:
     void SetUp() override {
-        Sample::CreateAllTypes();
-        _before = ObjectImpl::LiveObjects();
+        NoLeakTest::SetUp();
         adapter = new LoopbackAdapter();
         impl = new CalculatorImpl("calc-1");
         adapter->Register("calc-1", impl.Get());
@@ -58,7 +56,7 @@ protected:
         impl = nullptr;
         context = nullptr;
         adapter = nullptr;
-        EXPECT_EQ(ObjectImpl::LiveObjects(), _before);
+        NoLeakTest::TearDown();
     }
 
     static Orbit::ManagedObjectType* CalculatorType() {
@@ -82,14 +80,11 @@ protected:
     Ref<CalculatorImpl> impl;
     Ref<Orbit::RequestContext> context;
     Ref<CalculatorStub> stub;
-
-private:
-    long _before = 0;
 };
 
 TEST_F(LoopbackTest, SynchronousCallsReachTheImplementation) {
     EXPECT_EQ(stub->_GetStubAdapter(), adapter.Get());
-    EXPECT_EQ(stub->_GetRef()->GetType(), "test.Calculator");
+    EXPECT_EQ(stub->_GetRef()->GetType(), "fix.Calculator");
     EXPECT_EQ(stub->_GetRef()->GetId(), "calc-1");
 
     EXPECT_EQ(stub->Add(2, 3), 5);
@@ -99,7 +94,7 @@ TEST_F(LoopbackTest, SynchronousCallsReachTheImplementation) {
 
     EXPECT_EQ(stub->GetName(), "calc:calc-1");
 
-    Ref<Any> sent(new Orbit::MoRef("test.Counter", "n"));
+    Ref<Any> sent(new Orbit::MoRef("fix.Counter", "n"));
     Ref<Any> echoed;
     stub->Echo(sent.Get(), echoed);
     EXPECT_EQ(echoed.Get(), sent.Get());
@@ -126,7 +121,7 @@ TEST_F(LoopbackTest, SynchronousFaultsArriveAsTheirOwnClass) {
         EXPECT_EQ(typeid(e), typeid(BadRequest::Exception));
         ASSERT_NE(e.GetFault(), nullptr);
         EXPECT_EQ(e.GetFault()->GetMsg(), "bad input");
-        EXPECT_STREQ(e.what(), "test.BadRequest");
+        EXPECT_STREQ(e.what(), "fix.BadRequest");
     }
     EXPECT_EQ(LoopbackAdapter::CurrentContext(), nullptr);  // restored on the way out
 }
@@ -141,17 +136,17 @@ TEST_F(LoopbackTest, UnknownObjectsAndMissingMembersAreFaults) {
     // A counter's member asked of a calculator.
     Kernite::RefVector<Any> args(0);
     Ref<Any> result(new Orbit::Primitive<int>(0));
-    fault = FaultOf([&] { adapter->Invoke("calc-1", gTestCounterMethodObjects[0], args, result, nullptr); });
+    fault = FaultOf([&] { adapter->Invoke("calc-1", gFixCounterMethodObjects[0], args, result, nullptr); });
     ASSERT_TRUE(fault);
-    EXPECT_NE(fault->GetMsg().find("test.Counter.increment"), std::string::npos) << fault->GetMsg();
-    EXPECT_NE(fault->GetMsg().find("test.Calculator"), std::string::npos) << fault->GetMsg();
+    EXPECT_NE(fault->GetMsg().find("fix.Counter.increment"), std::string::npos) << fault->GetMsg();
+    EXPECT_NE(fault->GetMsg().find("fix.Calculator"), std::string::npos) << fault->GetMsg();
     EXPECT_EQ(result, nullptr);
 
     fault = FaultOf([&] { adapter->Invoke("calc-1", nullptr, args, result, nullptr); });
     EXPECT_TRUE(fault);
 
     // Arguments that do not fit the method are the dispatcher's to refuse.
-    EXPECT_THROW(adapter->Invoke("calc-1", gTestCalculatorMethodObjects[0], args, result, nullptr),
+    EXPECT_THROW(adapter->Invoke("calc-1", gFixCalculatorMethodObjects[0], args, result, nullptr),
                  Kernite::InvalidArgumentException);
 }
 
