@@ -1,5 +1,6 @@
 // A byte-driven sequence of operations on any registered data type: the record
-// functions with any index, copies and clones, sizes, equality and narrowing.
+// functions with any index, copies and clones, sizes, equality and narrowing, and
+// the conversions of any registered enumeration.
 // Invariants: nothing crashes; the only exceptions are those the operation
 // names (an unset optional read, a value of the wrong class); a copy is equal to
 // its source and independent of it; a refused write changes nothing; and when the
@@ -22,21 +23,12 @@ using Orbit::DataObject;
 using Orbit::DataObjectType;
 using Reliability::Chooser;
 using Reliability::Storage;
+using Reliability::Stranger;
 
 [[noreturn]] void Finding(const std::string& what) {
     std::fprintf(stderr, "data object fuzzer: %s\n", what.c_str());
     std::abort();
 }
-
-// A value of a class that no property has.
-class Stranger : public Any {
-public:
-    Orbit::Type* _GetType() const override { return nullptr; }
-    unsigned int _GetSize(Orbit::SizeFunction f) const override { return f(sizeof(Stranger)); }
-    Any* _Clone() const override { return const_cast<Stranger*>(this); }
-    bool _IsEqual(Any* other, bool) const override { return other == this; }
-    void _DiffProperties(Any*, const std::string&, Orbit::PropertyDiffSet&) const override {}
-};
 
 unsigned int Exact(unsigned int n) { return n; }
 unsigned int RoundUp(unsigned int n) { return (n + 15) & ~15u; }
@@ -44,6 +36,16 @@ unsigned int RoundUp(unsigned int n) { return (n + 15) & ~15u; }
 std::vector<DataObjectType*>& Types() {
     static std::vector<DataObjectType*> types = Reliability::RegisteredDataTypes();
     return types;
+}
+
+std::vector<Orbit::EnumType*>& Enums() {
+    static std::vector<Orbit::EnumType*> enums = [] {
+        std::vector<Orbit::EnumType*> out;
+        for (Orbit::Type* type : Orbit::GetTypeMap()->GetTypes())
+            if (auto* e = dynamic_cast<Orbit::EnumType*>(type)) out.push_back(e);
+        return out;
+    }();
+    return enums;
 }
 
 long gBaseline = 0;
@@ -133,7 +135,7 @@ private:
 
     void Step() {
         DataObject* object = Top();
-        switch (_choose.Below(11)) {
+        switch (_choose.Below(12)) {
         case 0:
         case 1: {  // write a chosen value
             Slot slot = ChooseSlot(object, _choose);
@@ -236,7 +238,57 @@ private:
             _stack.back() = Ref<DataObject>(Kernite::NarrowToType<DataObject, Any>(copy.Get()));
             break;
         }
+        case 11: Enumeration(*Enums()[_choose.Below(static_cast<std::uint32_t>(Enums().size()))]); break;
         }
+    }
+
+    // A tag: a real one, one changed, or any text.
+    std::string ChooseTag(const std::vector<std::string>& tags) {
+        std::string tag = _choose.Below(3) ? tags[_choose.Below(static_cast<std::uint32_t>(tags.size()))] : _choose.Text();
+        if (_choose.Below(4) == 0) tag += static_cast<char>(_choose.Byte());
+        return tag;
+    }
+
+    // A known tag and its value convert both ways, one by one and as arrays; anything
+    // else is refused and leaves the output as it was.
+    void Enumeration(Orbit::EnumType& type) {
+        std::vector<std::string> tags;
+        type.GetEnumTags(tags);
+        const int count = static_cast<int>(tags.size());
+        const int value = static_cast<int>(_choose.Below(static_cast<std::uint32_t>(count) + 2)) - 1;
+        const bool inRange = value >= 0 && value < count;
+        if (Refused([&] { type.GetTag(value); }) == inRange) Finding("GetTag of " + std::to_string(value));
+        Ref<Orbit::Array<std::string>> names(new Orbit::Array<std::string>());
+        bool known = true;
+        for (std::uint32_t n = _choose.Below(5) + 1; n > 0; --n) {
+            names->Append(ChooseTag(tags));
+            known = known && type.HasValue(names->GetItems().back());
+            if (known && type.GetTag(type.GetValue(names->GetItems().back())) != names->GetItems().back())
+                Finding("a tag does not come back: " + names->GetItems().back());
+        }
+        Ref<Any> kept(new Orbit::Primitive<int>(0));
+        Ref<Any> box = kept, values = kept;
+        if (Refused([&] { type.StringToEnum(names->GetAt(0), box); }) == type.HasValue(names->GetAt(0)) ||
+            Refused([&] { type.StringArrayToEnumArray(names.Get(), values); }) == known)
+            Finding("a conversion refused a known tag or took an unknown one");
+        if (!known) {
+            if (values != kept) Finding("a refused conversion wrote its output");
+            return;
+        }
+        Ref<Orbit::Array<std::string>> back;
+        type.EnumArrayToStringArray(values.Get(), back);
+        if (!back->_IsEqual(names.Get()) || type.EnumToString(box.Get()) != names->GetAt(0))
+            Finding("tags do not come back through a box or an array");
+    }
+
+    template <class Call>
+    static bool Refused(Call call) {
+        try {
+            call();
+        } catch (const Kernite::InvalidArgumentException&) {
+            return true;
+        }
+        return false;
     }
 
     Chooser& _choose;

@@ -1,20 +1,20 @@
 // Races that the library must survive, written for ThreadSanitizer (they run in
 // every preset): first reads of the same lazy array property, reference-count
 // storms on one shared object, synchronous and asynchronous calls through one stub
-// on one adapter, and an adapter released on its own worker thread.
+// on one adapter, and an adapter released on its own worker thread. They run on the
+// runtime's test catalogue, whose generated code is the real catalogue's in small.
 #include <gtest/gtest.h>
 
 #include <atomic>
 #include <barrier>
 #include <chrono>
-#include <cstdio>
 #include <functional>
 #include <thread>
 #include <vector>
 
+#include "fix/doubles.h"
+#include "fix/fix.h"
 #include "orbit/Loopback.h"
-#include "tarn/testing.h"
-#include "tarn/types.h"
 #include "values.h"
 
 namespace {
@@ -68,53 +68,48 @@ int PropertyIndex(const Orbit::DataObjectType* type, const std::string& name) {
 
 TEST(Concurrency, FirstReadsOfALazyArrayInstallOneArray) {
     constexpr int kRounds = 300;
-    auto* hostType = Kernite::NarrowToType<Orbit::DataObjectType, Orbit::Type>(Orbit::GetType<Tarn::Vmprov::HostState>());
-    const int mountInfo = PropertyIndex(hostType, "mountInfo");
-    ASSERT_GE(mountInfo, 0);
+    auto* shapeType = Orbit::GetDoType<Fix::Shape>();
+    const int children = PropertyIndex(shapeType, "children");
+    ASSERT_GE(children, 0);
 
     const long baseline = LiveObjects();
-    Ref<Tarn::Ft::FtVmInfo> ft;
-    Ref<Tarn::Vmprov::CloneContext> clone;
-    Ref<Tarn::Vmprov::HostState> host;
+    Ref<Fix::Shape> first, second;
     // What each thread saw: through the out-of-line getters and through getProperty.
-    std::vector<Orbit::Any*> ftSeen(kThreads), cloneSeen(kThreads);
-    std::vector<Ref<Orbit::Any>> hostSeen(kThreads);
+    std::vector<Orbit::Any*> tagsSeen(kThreads), childrenSeen(kThreads);
+    std::vector<Ref<Orbit::Any>> recordSeen(kThreads);
     int failures = 0;
 
     Race(
         kRounds,
         [&](int) {
-            ft = new Tarn::Ft::FtVmInfo();
-            clone = new Tarn::Vmprov::CloneContext();
-            host = new Tarn::Vmprov::HostState();
+            first = new Fix::Shape();
+            second = new Fix::Shape();
         },
         [&](int t, int) {
-            ftSeen[t] = ft->GetSecondaryVmList();
-            cloneSeen[t] = clone->GetMacAssignmentData();
-            hostType->GetDataTypeInfo()->getProperty(host.Get(), mountInfo, &hostSeen[t]);
+            tagsSeen[t] = first->GetTags();
+            childrenSeen[t] = first->GetChildren();
+            shapeType->GetDataTypeInfo()->getProperty(second.Get(), children, &recordSeen[t]);
         },
         [&](int) {
             for (int t = 0; t < kThreads; ++t) {
-                bool one = ftSeen[t] != nullptr && ftSeen[t] == ftSeen[0] && ftSeen[t] == ft->GetSecondaryVmList() &&
-                           cloneSeen[t] != nullptr && cloneSeen[t] == clone->GetMacAssignmentData() && hostSeen[t] &&
-                           hostSeen[t] == hostSeen[0] && hostSeen[t].Get() == host->GetMountInfo();
+                bool one = tagsSeen[t] != nullptr && tagsSeen[t] == first->GetTags() && childrenSeen[t] != nullptr &&
+                           childrenSeen[t] == first->GetChildren() && recordSeen[t] &&
+                           recordSeen[t].Get() == second->GetChildren();
                 failures += one ? 0 : 1;
             }
             // The arrays of the losers are gone already; the winners go with their objects.
-            hostSeen.assign(kThreads, nullptr);
-            ft = nullptr;
-            clone = nullptr;
-            host = nullptr;
+            recordSeen.assign(kThreads, nullptr);
+            first = nullptr;
+            second = nullptr;
             failures += LiveObjects() == baseline ? 0 : 1;
         });
     EXPECT_EQ(failures, 0);
     EXPECT_EQ(LiveObjects(), baseline);
-    std::printf("lazy array first reads: %d threads x %d rounds x 3 properties\n", kThreads, kRounds);
 }
 
 TEST(Concurrency, ReferenceCountStormsOnASharedObject) {
     constexpr int kIterations = 20000;
-    auto* type = Kernite::NarrowToType<Orbit::DataObjectType, Orbit::Type>(Orbit::GetType<Tarn::Vmprov::VmState>());
+    auto* type = Orbit::GetDoType<Fix::Shape>();
     {
         // Types the runtime makes on first use (its own roots, array types) stay.
         Ref<Orbit::DataObject> warmUp = Reliability::MakePopulated(type, 7, 2, 2);
@@ -154,26 +149,25 @@ TEST(Concurrency, ReferenceCountStormsOnASharedObject) {
         EXPECT_EQ(LiveObjects(), populated);
     }
     EXPECT_EQ(LiveObjects(), baseline);
-    std::printf("reference-count storms: %d threads x %d iterations\n", kThreads, kIterations);
 }
 
 TEST(Concurrency, SynchronousAndAsynchronousCallsThroughOneStub) {
     constexpr int kCalls = 150;
     {
         Ref<Orbit::LoopbackAdapter> adapter(new Orbit::LoopbackAdapter());
-        adapter->Register("debug-1", Ref<Tarn::DebugManagerDouble>(new Tarn::DebugManagerDouble("debug-1")).Get());
-        Ref<Tarn::DebugManagerStub> stub(new Tarn::DebugManagerStub("debug-1", adapter.Get(), nullptr));
-        Ref<Orbit::MoRef> result;
-        stub->GetAlertManager(result);  // first use of the types and method objects
+        adapter->Register("calc-1", Ref<Fix::CalculatorDouble>(new Fix::CalculatorDouble("calc-1")).Get());
+        Ref<Fix::CalculatorStub> stub(new Fix::CalculatorStub("calc-1", adapter.Get(), nullptr));
+        Ref<Orbit::Any> result;
+        stub->Echo(nullptr, result);  // first use of the types and method objects
     }
     const long baseline = LiveObjects();
     {
         Ref<Orbit::LoopbackAdapter> adapter(new Orbit::LoopbackAdapter());
-        Ref<Tarn::DebugManagerDouble> debug(new Tarn::DebugManagerDouble("debug-1"));
-        Ref<Orbit::MoRef> alerts(new Orbit::MoRef("tarn.AlertManager", "alerts-1"));
-        debug->Program("GetAlertManager", alerts.Get());
-        adapter->Register("debug-1", debug.Get());
-        Ref<Tarn::DebugManagerStub> stub(new Tarn::DebugManagerStub("debug-1", adapter.Get(), nullptr));
+        Ref<Fix::CalculatorDouble> calc(new Fix::CalculatorDouble("calc-1"));
+        Ref<Orbit::MoRef> answer(new Orbit::MoRef("fix.Counter", "counter-1"));
+        calc->Program("Echo", answer.Get());
+        adapter->Register("calc-1", calc.Get());
+        Ref<Fix::CalculatorStub> stub(new Fix::CalculatorStub("calc-1", adapter.Get(), nullptr));
 
         std::atomic<int> completed{0}, wrong{0};
         Race(
@@ -182,19 +176,19 @@ TEST(Concurrency, SynchronousAndAsynchronousCallsThroughOneStub) {
                 std::vector<Ref<ScheduledItem>> items;
                 for (int i = 0; i < kCalls; ++i) {
                     const std::string message = "thread " + std::to_string(t) + " call " + std::to_string(i);
-                    stub->MarkLogs(message);
-                    Ref<Orbit::MoRef> result;
-                    stub->GetAlertManager(result);
-                    if (result != alerts) wrong.fetch_add(1);
+                    stub->Fail(message);
+                    Ref<Orbit::Any> result;
+                    stub->Echo(nullptr, result);
+                    if (result.Get() != answer.Get()) wrong.fetch_add(1);
 
                     Ref<ScheduledItem> item;
-                    stub->MarkLogs(message, [&](ScheduledItem*, Kernite::Exception* e, Orbit::Any* r) {
+                    stub->Fail(message, [&](ScheduledItem*, Kernite::Exception* e, Orbit::Any* r) {
                         if (e != nullptr || r != nullptr) wrong.fetch_add(1);
                         completed.fetch_add(1);
                     }, item);
                     items.push_back(item);
-                    stub->GetAlertManager([&](ScheduledItem*, Kernite::Exception* e, Orbit::Any* r) {
-                        if (e != nullptr || r != alerts.Get()) wrong.fetch_add(1);
+                    stub->Echo(nullptr, [&](ScheduledItem*, Kernite::Exception* e, Orbit::Any* r) {
+                        if (e != nullptr || r != answer.Get()) wrong.fetch_add(1);
                         completed.fetch_add(1);
                     }, item);
                     items.push_back(item);
@@ -205,12 +199,11 @@ TEST(Concurrency, SynchronousAndAsynchronousCallsThroughOneStub) {
             [](int) {});
         EXPECT_EQ(wrong.load(), 0);
         EXPECT_EQ(completed.load(), kThreads * kCalls * 2);
-        EXPECT_EQ(debug->GetCalls().size(), static_cast<std::size_t>(kThreads * kCalls * 4));
-        debug->ClearCalls();
+        EXPECT_EQ(calc->GetCalls().size(), static_cast<std::size_t>(kThreads * kCalls * 4));
+        calc->ClearCalls();
         adapter->Shutdown();
     }
     EXPECT_EQ(LiveObjects(), baseline);
-    std::printf("stub calls: %d threads x %d iterations x (2 synchronous + 2 asynchronous)\n", kThreads, kCalls);
 }
 
 // The adapter's last reference may be dropped on its worker thread, inside a
@@ -223,17 +216,17 @@ TEST(AdapterLifetime, LastReferenceDroppedInsideACompletionCallback) {
     Ref<ScheduledItem> first, second;
     {
         Ref<Orbit::LoopbackAdapter> adapter(new Orbit::LoopbackAdapter());
-        adapter->Register("debug-1", Ref<Tarn::DebugManagerDouble>(new Tarn::DebugManagerDouble("debug-1")).Get());
+        adapter->Register("calc-1", Ref<Fix::CalculatorDouble>(new Fix::CalculatorDouble("calc-1")).Get());
         // Only the stub holds the adapter, and only `owner` holds the stub.
-        auto* owner = new Ref<Tarn::DebugManagerStub>(new Tarn::DebugManagerStub("debug-1", adapter.Get(), nullptr));
+        auto* owner = new Ref<Fix::CalculatorStub>(new Fix::CalculatorStub("calc-1", adapter.Get(), nullptr));
         adapter = nullptr;
 
-        (*owner)->MarkLogs("blocks the worker until both calls are queued", [&callbacks, &go, owner](ScheduledItem*, Kernite::Exception*, Orbit::Any*) {
+        (*owner)->Fail("blocks the worker until both calls are queued", [&callbacks, &go, owner](ScheduledItem*, Kernite::Exception*, Orbit::Any*) {
             while (!go.load()) std::this_thread::yield();
             callbacks.fetch_add(1);
             delete owner;  // the last reference to the stub, and so to the adapter
         }, first);
-        (*owner)->MarkLogs("queued behind it", [&](ScheduledItem*, Kernite::Exception* e, Orbit::Any*) {
+        (*owner)->Fail("queued behind it", [&](ScheduledItem*, Kernite::Exception* e, Orbit::Any*) {
             if (e == nullptr) callbacks.fetch_add(1);
         }, second);
         go = true;
@@ -254,11 +247,11 @@ TEST(AdapterLifetime, LastReferenceHeldByTheCallbackItself) {
         Ref<ScheduledItem> item;
         {
             Ref<Orbit::LoopbackAdapter> adapter(new Orbit::LoopbackAdapter());
-            adapter->Register("debug-1", Ref<Tarn::DebugManagerDouble>(new Tarn::DebugManagerDouble("debug-1")).Get());
-            Ref<Tarn::DebugManagerStub> stub(new Tarn::DebugManagerStub("debug-1", adapter.Get(), nullptr));
+            adapter->Register("calc-1", Ref<Fix::CalculatorDouble>(new Fix::CalculatorDouble("calc-1")).Get());
+            Ref<Fix::CalculatorStub> stub(new Fix::CalculatorStub("calc-1", adapter.Get(), nullptr));
             // The copy of the callback inside the queued call keeps the stub, and the
             // stub the adapter; both go when the worker drops the finished call.
-            stub->MarkLogs("m", [stub](ScheduledItem*, Kernite::Exception*, Orbit::Any*) { (void)stub; }, item);
+            stub->Fail("m", [stub](ScheduledItem*, Kernite::Exception*, Orbit::Any*) { (void)stub; }, item);
         }
         ASSERT_TRUE(item->WaitFor(std::chrono::seconds(60)));
         EXPECT_FALSE(item->IsFailed());
@@ -271,28 +264,28 @@ TEST(AdapterLifetime, ShutdownInsideACompletionCallback) {
     const long baseline = LiveObjects();
     {
         Ref<Orbit::LoopbackAdapter> adapter(new Orbit::LoopbackAdapter());
-        Ref<Tarn::DebugManagerDouble> debug(new Tarn::DebugManagerDouble("debug-1"));
-        adapter->Register("debug-1", debug.Get());
-        Ref<Tarn::DebugManagerStub> stub(new Tarn::DebugManagerStub("debug-1", adapter.Get(), nullptr));
+        Ref<Fix::CalculatorDouble> calc(new Fix::CalculatorDouble("calc-1"));
+        adapter->Register("calc-1", calc.Get());
+        Ref<Fix::CalculatorStub> stub(new Fix::CalculatorStub("calc-1", adapter.Get(), nullptr));
         std::atomic<bool> go{false}, refused{false};
         Ref<ScheduledItem> first, second;
-        stub->MarkLogs("first", [&](ScheduledItem*, Kernite::Exception*, Orbit::Any*) {
+        stub->Fail("first", [&](ScheduledItem*, Kernite::Exception*, Orbit::Any*) {
             while (!go.load()) std::this_thread::yield();
             adapter->Shutdown();  // runs "second" before returning
             Ref<ScheduledItem> late;
             try {
-                stub->MarkLogs("too late", {}, late);
+                stub->Fail("too late", {}, late);
             } catch (const Kernite::Exception&) {
                 refused = true;
             }
         }, first);
-        stub->MarkLogs("second", {}, second);
+        stub->Fail("second", {}, second);
         go = true;
         ASSERT_TRUE(first->WaitFor(std::chrono::seconds(60)));
         ASSERT_TRUE(second->WaitFor(std::chrono::seconds(60)));
         EXPECT_TRUE(refused.load());
-        EXPECT_EQ(debug->GetCalls().size(), 2u);
-        debug->ClearCalls();
+        EXPECT_EQ(calc->GetCalls().size(), 2u);
+        calc->ClearCalls();
     }
     EXPECT_TRUE(LiveObjectsSettleAt(baseline));
 }

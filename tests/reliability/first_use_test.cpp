@@ -1,5 +1,5 @@
-// First use of every one of the 124 types in a fresh process, by eight threads at
-// once. The loaders create each type object while the library loads, so what is
+// First use of every type of the runtime's test catalogue in a fresh process, by
+// eight threads at once. The loaders create each type object while the library loads, so what is
 // really used for the first time here is what nothing touches at load: the
 // per-class narrowed type caches (GetTypeHelper<T, DataObjectType> behind
 // _GetDataType, GetTypeHelper<T, ManagedObjectType> behind an interface's
@@ -8,11 +8,10 @@
 #include <gtest/gtest.h>
 
 #include <barrier>
-#include <cstdio>
 #include <thread>
 #include <vector>
 
-#include "tarn/types.h"
+#include "fix/fix.h"
 
 namespace {
 
@@ -39,11 +38,11 @@ struct Seen {
 
 TEST(FirstUse, EveryTypeByEightThreadsAtOnce) {
     // Naming a record links the library in (and asks nothing of its caches).
-    ASSERT_NE(Orbit::FindType(&gTarnLockStresserTypeInfo), nullptr);
+    ASSERT_NE(Orbit::FindType(&gFixColorTypeInfo), nullptr);
     std::vector<Subject> subjects;
     int managed = 0, data = 0, faults = 0, enums = 0;
     for (Orbit::Type* type : Orbit::GetTypeMap()->GetTypes()) {
-        if (type->GetName().rfind("tarn.", 0) != 0) continue;
+        if (type->GetName().rfind("fix.", 0) != 0) continue;
         Subject s;
         s.type = type;
         if (auto* dataType = dynamic_cast<Orbit::DataObjectType*>(type)) {
@@ -61,11 +60,7 @@ TEST(FirstUse, EveryTypeByEightThreadsAtOnce) {
         ASSERT_TRUE(s.array) << type->GetName();
         subjects.push_back(std::move(s));
     }
-    ASSERT_EQ(subjects.size(), 124u);
-    EXPECT_EQ(managed, 50);
-    EXPECT_EQ(data, 70);
-    EXPECT_EQ(faults, 1);
-    EXPECT_EQ(enums, 3);
+    ASSERT_TRUE(managed > 0 && data > 0 && faults > 0 && enums > 0) << "every kind races";
 
     std::vector<std::vector<Seen>> seen(kThreads, std::vector<Seen>(subjects.size()));
     Orbit::GetType<Orbit::MoRef>();  // the runtime's own type, made on demand; not one of ours
@@ -112,7 +107,6 @@ TEST(FirstUse, EveryTypeByEightThreadsAtOnce) {
     // One array type was kept per data, fault and enumeration type (arrays of managed
     // references share the reference's array type); the racers' spares are gone.
     EXPECT_EQ(LiveObjects() - before, data + faults + enums + 1);
-    std::printf("first use: %d threads x %zu types\n", kThreads, subjects.size());
 }
 
 }  // namespace

@@ -37,6 +37,16 @@ private:
     std::uint32_t _seed = 0;
 };
 
+// A value of a class that no property or parameter has.
+class Stranger : public Orbit::Any {
+public:
+    Orbit::Type* _GetType() const override { return nullptr; }
+    unsigned int _GetSize(Orbit::SizeFunction f) const override { return f(sizeof(Stranger)); }
+    Orbit::Any* _Clone() const override { return const_cast<Stranger*>(this); }
+    bool _IsEqual(Orbit::Any* other, bool) const override { return other == this; }
+    void _DiffProperties(Orbit::Any*, const std::string&, Orbit::PropertyDiffSet&) const override {}
+};
+
 // The data types of an object, root-most first (the runtime's roots included).
 std::vector<const Orbit::DataObjectType*> Chain(const Orbit::DataObjectType* type);
 

@@ -109,14 +109,6 @@ TEST(ManagedObjectTypeTest, MethodObjectsHoldMethodsThenPropertiesOfTheirDeclari
     EXPECT_EQ(awkward->FindMember("switch")->GetParameters()[0].name, "result");
 }
 
-TEST(ManagedObjectTypeTest, ConcurrentFirstUseMakesOneArrayType) {
-    std::vector<Type*> seen(4);
-    std::vector<std::thread> threads;
-    for (int t = 0; t < 4; ++t) threads.emplace_back([&seen, t] { seen[t] = Orbit::GetType<Fix::Counter>()->GetArrayType(); });
-    for (auto& thread : threads) thread.join();
-    for (Type* type : seen) EXPECT_EQ(type, Orbit::GetType<Fix::Counter>()->GetArrayType());
-}
-
 // ---- Registries ----
 
 // A small chain declared the way the loaders declare theirs: every version with its

@@ -3,7 +3,6 @@
 #include <gtest/gtest.h>
 
 #include <functional>
-#include <thread>
 #include <vector>
 
 #include "fixtures.h"
@@ -141,24 +140,6 @@ TEST_F(ValuesTest, ArrayFieldsInstallOnceAndClearInPlace) {
     EXPECT_EQ(copy.Peek()->GetItems(), installed->GetItems());
     field.Reset();
     EXPECT_TRUE(field.Peek()->IsEmpty());
-}
-
-// First reads racing on one field, and on one type's array type: all get the one
-// installed, and the losers' are released.
-TEST_F(ValuesTest, RacingFirstReadersShareOneArray) {
-    for (int fence : {0, 1}) {
-        Kernite::AtomicUseFence = fence;
-        for (int round = 0; round < 20; ++round) {
-            Orbit::ArrayField<DataArray<Shape>> field;
-            std::vector<DataArray<Shape>*> seen(4);
-            std::vector<std::thread> readers;
-            for (int t = 0; t < 4; ++t) readers.emplace_back([&field, &seen, t] { seen[t] = field.Get(); });
-            for (auto& reader : readers) reader.join();
-            for (auto* array : seen) EXPECT_EQ(array, field.Peek());
-            EXPECT_EQ(field.Peek()->GetRefCount(), 1);
-        }
-    }
-    Kernite::AtomicUseFence = 0;
 }
 
 TEST_F(ValuesTest, ManagedObjectReferencesCompareByTypeAndId) {

@@ -5,9 +5,15 @@
 # the target <prefix>-generated makes them all.
 include_guard(GLOBAL)
 
-# The generator is a host tool: built once per build tree, without the preset's
-# sanitizer flags, before any catalogue is listed.
-set(TARN_GEN_HOST_DIR ${CMAKE_BINARY_DIR}/tarn-gen-host)
+# The generator is a host tool, built before any catalogue is listed, without the
+# preset's compiler and sanitizer flags; build trees side by side in one build/
+# folder (the presets') share one.
+get_filename_component(tarn_build_parent ${CMAKE_BINARY_DIR} DIRECTORY)
+if(tarn_build_parent STREQUAL "${PROJECT_SOURCE_DIR}/build")
+  set(TARN_GEN_HOST_DIR ${tarn_build_parent}/tarn-gen-host)
+else()
+  set(TARN_GEN_HOST_DIR ${CMAKE_BINARY_DIR}/tarn-gen-host)
+endif()
 set(TARN_GEN ${TARN_GEN_HOST_DIR}/tarn-gen CACHE INTERNAL "the host generator")
 file(GLOB tarn_gen_sources CONFIGURE_DEPENDS ${CMAKE_CURRENT_LIST_DIR}/*.cpp ${CMAKE_CURRENT_LIST_DIR}/*.h)
 set_property(DIRECTORY ${PROJECT_SOURCE_DIR} APPEND PROPERTY CMAKE_CONFIGURE_DEPENDS
@@ -19,8 +25,7 @@ if(TARN_WERROR)
 endif()
 execute_process(
   COMMAND ${CMAKE_COMMAND} -S ${CMAKE_CURRENT_LIST_DIR} -B ${TARN_GEN_HOST_DIR} -G ${CMAKE_GENERATOR}
-          -DCMAKE_CXX_COMPILER=${CMAKE_CXX_COMPILER} -DCMAKE_CXX_COMPILER_LAUNCHER=${CMAKE_CXX_COMPILER_LAUNCHER}
-          -DCMAKE_CXX_FLAGS=${tarn_gen_flags}
+          -DCMAKE_CXX_COMPILER_LAUNCHER=${CMAKE_CXX_COMPILER_LAUNCHER} -DCMAKE_CXX_FLAGS=${tarn_gen_flags}
   RESULT_VARIABLE status OUTPUT_VARIABLE log ERROR_VARIABLE log)
 if(status EQUAL 0)
   execute_process(COMMAND ${CMAKE_COMMAND} --build ${TARN_GEN_HOST_DIR}
