@@ -208,6 +208,52 @@ Ref<Any> MakeSample(const Orbit::Member& member, int seed) {
     throw std::logic_error("unreachable");
 }
 
+Ref<Orbit::DataObject> MakeFullObject(Orbit::DataObjectType* type, int seed, bool optionals,
+                                      const Orbit::Version* seenBy, int depth) {
+    Ref<Orbit::DataObject> object = type->CreateInstance();
+    for (const Orbit::DataObjectType* t = type; t != nullptr; t = t->GetBaseDataType()) {
+        const Orbit::DataTypeInfo* info = t->GetDataTypeInfo();
+        const auto& properties = t->GetProperties();
+        for (int i = 0; i < static_cast<int>(properties.size()); ++i) {
+            const Orbit::Member& p = properties[i];
+            if ((p.IsOptional() && !optionals) || (seenBy != nullptr && !p.IsVisible(seenBy))) continue;
+            const int s = seed + i;
+            auto set = [&](const auto& value) { info->setProperty(object.Get(), i, &value); };
+            const Shape shape = ShapeOf(p.GetType());
+            if (p.IsArray() || shape == Shape::Data || shape == Shape::AnyValue || shape == Shape::MoRef) {
+                // Deep enough: what may be left out is.
+                if (shape == Shape::Data && depth <= 0 && (p.IsArray() || p.IsOptional())) continue;
+                info->setProperty(object.Get(), i, MakeFullSample(p, s, optionals, seenBy, depth - 1).Get());
+                continue;
+            }
+            switch (shape) {
+            case Shape::String: set(StringValue(s)); break;
+            case Shape::Bool: set(BoolValue(s)); break;
+            case Shape::Int: set(IntValue(s)); break;
+            case Shape::Long: set(LongValue(s)); break;
+            case Shape::Double: set(DoubleValue(s)); break;
+            case Shape::DateTime: set(DateTimeValue(s)); break;
+            case Shape::MethodName: set(MethodNameValue(s)); break;
+            case Shape::Enum: set(EnumOf(p.GetType())->GetValue(TagOf(EnumOf(p.GetType()), s))); break;
+            default: break;
+            }
+        }
+    }
+    return object;
+}
+
+Ref<Any> MakeFullSample(const Orbit::Member& member, int seed, bool optionals, const Orbit::Version* seenBy,
+                        int depth) {
+    if (ShapeOf(member.GetType()) != Shape::Data) return MakeSample(member, seed);
+    Orbit::DataObjectType* type = DataTypeOf(member.GetType());
+    if (!member.IsArray()) return Ref<Any>(MakeFullObject(type, seed, optionals, seenBy, depth));
+    Ref<Any> made = type->CreateArray();
+    auto* items = Kernite::NarrowToType<Orbit::DataObjectArrayBase, Any>(made.Get());
+    for (int k = 0; k < 2 && depth >= 0; ++k)
+        items->CheckedAppend(MakeFullObject(type, seed + k, optionals, seenBy, depth).Get());
+    return made;
+}
+
 Ref<Any> MakeTaskReference(int seed) {
     return Ref<Any>(new Orbit::MoRef("cairn.Task", "task-" + std::to_string(seed)));
 }

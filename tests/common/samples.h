@@ -36,6 +36,15 @@ bool TakesAnyResult(const Orbit::ManagedMethod* member);
 Kernite::Ref<Orbit::Any> MakeSample(const Orbit::Member& member, int seed);
 // One item of `type` (never an array).
 Kernite::Ref<Orbit::Any> MakeItem(Orbit::Type* type, int seed);
+// An object of `type` with every property of its class and bases that `seenBy` sees
+// set (all of them when null): scalars and references as MakeSample makes them,
+// arrays of two, optional members only when `optionals`. Nested data objects are
+// filled the same way, `depth` levels down; below that only required ones are made.
+Kernite::Ref<Orbit::DataObject> MakeFullObject(Orbit::DataObjectType* type, int seed, bool optionals,
+                                               const Orbit::Version* seenBy = nullptr, int depth = 2);
+// MakeSample, with data objects (and arrays of them) made by MakeFullObject.
+Kernite::Ref<Orbit::Any> MakeFullSample(const Orbit::Member& member, int seed, bool optionals,
+                                        const Orbit::Version* seenBy = nullptr, int depth = 2);
 // The reference a task method hands back: the task that runs it.
 Kernite::Ref<Orbit::Any> MakeTaskReference(int seed);
 // The fault a member's double throws: the first fault the member declares, or a

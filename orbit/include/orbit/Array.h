@@ -89,6 +89,13 @@ public:
     bool IsEmpty() const override { return _vec.empty(); }
     int GetLength() const override { return static_cast<int>(_vec.size()); }
     void Clear() override { _vec.clear(); }
+    // The item at `index`, possibly null, without taking a reference: for readers that
+    // do not know the item class.
+    Any* GetItem(int index) const {
+        if (!(0 <= index && index < (int)_vec.size()))
+            Kernite::PanicAssert("0 <= index && index < (int)_vec.size()", "orbit/array", __LINE__);
+        return _vec[index].Get();
+    }
     void RemoveAt(int index);
     void Reserve(int capacity);
     unsigned int _GetSize(SizeFunction f) const override;

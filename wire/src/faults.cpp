@@ -1,0 +1,122 @@
+#include "orbit/wire/Faults.h"
+
+#include "orbit/Dispatch.h"
+#include "orbit/Registry.h"
+
+namespace Orbit::Wire {
+namespace {
+
+constexpr const char* kVersion = "strata.version.version0";
+
+void NoGet(DataObject*, int, void*) {}
+void NoSet(DataObject*, int, const void*) {}
+bool AlwaysSet(DataObject*, int) { return true; }
+void NoUnset(DataObject*, int) {}
+
+constexpr PropertyInfo kNoProperties[] = {{nullptr, nullptr, 0, nullptr, Flag::End, nullptr}};
+constexpr PropertyInfo kInvalidRequestProperties[] = {
+    {"path", nullptr, 0, &gStringTypeInfo, 0, kVersion},
+    {nullptr, nullptr, 0, nullptr, Flag::End, nullptr},
+};
+
+void GetPath(DataObject* object, int index, void* value) {
+    auto* fault = NarrowTarget<InvalidRequest, DataObject>(object);
+    if (index == 0) WriteValue<std::string>(value) = fault->GetPath();
+}
+
+void SetPath(DataObject* object, int index, const void* value) {
+    auto* fault = NarrowTarget<InvalidRequest, DataObject>(object);
+    if (index == 0) fault->SetPath(ReadValue<std::string>(value));
+}
+
+bool IsPathSet(DataObject* object, int) {
+    NarrowTarget<InvalidRequest, DataObject>(object);
+    return true;
+}
+
+const TypeInfo kInvalidRequestHeader{Kind::Fault, "strata.wire.InvalidRequest", "StrataWireInvalidRequest", kVersion};
+
+DataObject* NewInvalidRequest() { return new InvalidRequest(); }
+Any* NewInvalidRequestArray() { return new DataArray<InvalidRequest>(); }
+
+const DataTypeInfo kInvalidRequestRecord{&kInvalidRequestHeader, &gStrataMethodFaultTypeInfo,
+                                         kInvalidRequestProperties, GetPath, SetPath, IsPathSet, NoUnset,
+                                         NewInvalidRequest, NewInvalidRequestArray};
+
+// The records of one kind: its header names it, its base is InvalidRequest.
+template <class F>
+struct KindRecord {
+    static const TypeInfo header;
+    static DataObject* Create() { return new F(); }
+    static Any* CreateArray() { return new DataArray<F>(); }
+    static constexpr DataTypeInfo record{&header, &kInvalidRequestHeader, kNoProperties, NoGet, NoSet,
+                                         AlwaysSet, NoUnset, Create, CreateArray};
+};
+
+#define ORBIT_WIRE_KIND(Name)                                                                       \
+    template <>                                                                                     \
+    const TypeInfo KindRecord<Name>::header{Kind::Fault, "strata.wire." #Name, "StrataWire" #Name, \
+                                            kVersion};
+ORBIT_WIRE_KIND(MalformedMessage)
+ORBIT_WIRE_KIND(UnknownElement)
+ORBIT_WIRE_KIND(MissingElement)
+ORBIT_WIRE_KIND(InvalidValue)
+ORBIT_WIRE_KIND(LimitExceeded)
+ORBIT_WIRE_KIND(UnknownMethod)
+ORBIT_WIRE_KIND(UnknownVersion)
+#undef ORBIT_WIRE_KIND
+
+// Registered when the library loads, so that a peer's fault finds its class by name.
+struct Registration {
+    Registration() {
+        TypeMap* map = GetTypeMap();
+        map->AddType(GetType<InvalidRequest>());
+        map->AddType(GetType<MalformedMessage>());
+        map->AddType(GetType<UnknownElement>());
+        map->AddType(GetType<MissingElement>());
+        map->AddType(GetType<InvalidValue>());
+        map->AddType(GetType<LimitExceeded>());
+        map->AddType(GetType<UnknownMethod>());
+        map->AddType(GetType<UnknownVersion>());
+    }
+} gRegistration;
+
+}  // namespace
+
+InvalidRequest::Exception* InvalidRequest::Exception::Clone() const { return new Exception(*this); }
+void InvalidRequest::Exception::Throw() const { throw *this; }
+
+Type* InvalidRequest::_GetType() const { return GetType<InvalidRequest>(); }
+DataObjectType* InvalidRequest::_GetDataType() const { return GetDoType<InvalidRequest>(); }
+unsigned int InvalidRequest::_GetSize(SizeFunction f) const {
+    return MethodFault::_GetSize(f) - f(sizeof(MethodFault)) + f(sizeof(InvalidRequest)) +
+           f(GetPrimitiveExtraSize(_path));
+}
+Any* InvalidRequest::_Clone() const { return new InvalidRequest(*this); }
+void InvalidRequest::Throw() { throw Exception(_GetType()->GetName(), this); }
+InvalidRequest::Exception* InvalidRequest::CreateException() { return new Exception(_GetType()->GetName(), this); }
+
+}  // namespace Orbit::Wire
+
+namespace Orbit {
+
+template <> Type* GetType<Wire::InvalidRequest>() {
+    static Type* const type = CreateDataObjectType(&Wire::kInvalidRequestRecord);
+    return type;
+}
+
+#define ORBIT_WIRE_GET_TYPE(Name)                                                      \
+    template <> Type* GetType<Wire::Name>() {                                          \
+        static Type* const type = CreateDataObjectType(&Wire::KindRecord<Wire::Name>::record); \
+        return type;                                                                   \
+    }
+ORBIT_WIRE_GET_TYPE(MalformedMessage)
+ORBIT_WIRE_GET_TYPE(UnknownElement)
+ORBIT_WIRE_GET_TYPE(MissingElement)
+ORBIT_WIRE_GET_TYPE(InvalidValue)
+ORBIT_WIRE_GET_TYPE(LimitExceeded)
+ORBIT_WIRE_GET_TYPE(UnknownMethod)
+ORBIT_WIRE_GET_TYPE(UnknownVersion)
+#undef ORBIT_WIRE_GET_TYPE
+
+}  // namespace Orbit
