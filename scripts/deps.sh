@@ -4,6 +4,7 @@ set -euo pipefail
 packages=(g++ cmake ninja-build libboost-dev libgtest-dev libgmock-dev libbenchmark-dev
           nlohmann-json3-dev  # the tests read tarn-catalog's JSON with it
           libprotobuf-dev protobuf-compiler  # the benchmarks' side-by-side twin
+          libpugixml-dev python3-zeep  # the wire's XML parser; the SOAP client that reads its WSDL
           clang-14 libclang-rt-14-dev)  # clang and its libFuzzer, for the fuzz preset
 missing=()
 for p in "${packages[@]}"; do

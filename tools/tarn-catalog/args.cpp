@@ -40,6 +40,10 @@ Options ParseArgs(const std::vector<std::string>& args) {
         if (operands != 1) throw UsageError("'show' needs exactly one wire name, for example tarn.DebugManager");
         o.command = Command::Show;
         o.typeName = words[1];
+    } else if (command == "wsdl") {
+        if (operands != 0) throw UsageError("'wsdl' takes no operand");
+        if (!o.version) throw UsageError("'wsdl' describes one API version: give --api-version NAME");
+        o.command = Command::Wsdl;
     } else if (command == "dump") {
         if (operands != 0) throw UsageError("'dump' takes no operand");
         if (!json) throw UsageError("'dump' writes JSON only: use 'dump --json'");
@@ -69,6 +73,8 @@ Commands:
                     flag and the versions each one includes
   dump --json       everything in one JSON document:
                     {"loaders", "calls", "versions", "types"}
+  wsdl              with --api-version: the WSDL 1.1 document, with its XML
+                    Schema, of exactly what that version sees on the wire
 
 Options:
   --api-version NAME
@@ -93,6 +99,7 @@ Examples:
   tarn-catalog show tarn.DebugManager
   tarn-catalog --api-version tarn.version.version1 show tarn.ServiceInstance
   tarn-catalog dump --json
+  tarn-catalog wsdl --api-version tarn.version.version8
 )";
 }
 

@@ -8,7 +8,7 @@
 
 namespace tarncatalog {
 
-enum class Command { List, Show, Versions, Dump, Help, ToolVersion };
+enum class Command { List, Show, Versions, Dump, Wsdl, Help, ToolVersion };
 
 struct Options {
     Command command = Command::List;

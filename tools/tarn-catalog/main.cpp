@@ -8,6 +8,7 @@
 #include "args.h"
 #include "catalog.h"
 #include "json_output.h"
+#include "orbit/wire/Wsdl.h"
 #include "text_output.h"
 
 namespace {
@@ -47,6 +48,9 @@ int Run(const tarncatalog::Options& options) {
         break;
     case Command::Dump:
         tarncatalog::WriteJson(catalog, std::cout);
+        break;
+    case Command::Wsdl:
+        Orbit::Wire::WriteWsdl(*seenBy, std::cout);
         break;
     case Command::Show: {
         for (const tarncatalog::TypeEntry& t : catalog.types) {

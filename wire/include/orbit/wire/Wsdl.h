@@ -1,0 +1,16 @@
+// The WSDL 1.1 description of what one API version sees, written from the same
+// tables that the codec uses, so that the two cannot disagree. One port type holds
+// every operation of every managed type the version sees (methods by wsdl name,
+// property reads as "<flat name>.<property>"); each operation declares its faults
+// and the wire's strata.wire.InvalidRequest, and carries the version's SOAPAction.
+#pragma once
+
+#include <ostream>
+
+#include "orbit/Registry.h"
+
+namespace Orbit::Wire {
+
+void WriteWsdl(const Version& version, std::ostream& out);
+
+}  // namespace Orbit::Wire
