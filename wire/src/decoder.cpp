@@ -141,17 +141,16 @@ pugi::xml_node Decoder::Body(std::string_view body) {
     if (envelope.ns != Ns::Soap || envelope.local != "Envelope")
         ThrowFault<MalformedMessage>("", "not a SOAP 1.1 envelope");
     pugi::xml_node child = NextElement(root.first_child());
-    if (child) {
-        Entered header = Enter(child);
-        Leave(header);
-        if (header.ns == Ns::Soap && header.local == "Header") {
-            Skip(child);
-            child = NextElement(child.next_sibling());
-        }
-    }
     if (!child) ThrowFault<MalformedMessage>("", "an envelope without a body");
-    Entered bodyElement = Enter(child);
-    if (bodyElement.ns != Ns::Soap || bodyElement.local != "Body")
+    Entered part = Enter(child);
+    if (part.ns == Ns::Soap && part.local == "Header") {
+        Skip(child);
+        Leave(part);
+        child = NextElement(child.next_sibling());
+        if (!child) ThrowFault<MalformedMessage>("", "an envelope without a body");
+        part = Enter(child);
+    }
+    if (part.ns != Ns::Soap || part.local != "Body")
         ThrowFault<MalformedMessage>("", "an envelope whose second part is not the body");
     if (NextElement(child.next_sibling())) ThrowFault<MalformedMessage>("", "content after the body");
     pugi::xml_node content = NextElement(child.first_child());
@@ -696,7 +695,7 @@ std::string Decoder::Path() const {
             path += ']';
         }
     }
-    return path.empty() ? "/" : path;
+    return path;
 }
 
 template <class F>

@@ -20,7 +20,8 @@
 //
 // The message reads "<path>: <what is wrong>"; paths start at the body's element,
 // "/DebugAcquireLock/holdDurationMillis", and count repeated elements from 0,
-// "/DebugAcquireLock/objects[1]".
+// "/DebugAcquireLock/objects[1]". A fault of the message as a whole (not XML, not
+// an envelope, too large) has an empty path and names the byte where it can.
 #pragma once
 
 #include <string>
