@@ -31,6 +31,9 @@ void FillSnapshot(pb::SnapshotState* node, int i, int n, const TreeTexts& texts)
     }
 }
 
+}  // namespace
+
+// Shared with the wire's workloads (twins.h).
 void FillVmState(pb::VmState* vm, int n) {
     const TreeTexts& texts = TextsFor(n);
     vm->mutable_vm()->set_type(kVmType);
@@ -42,6 +45,8 @@ void FillVmState(pb::VmState* vm, int n) {
     vm->mutable_capability();
     FillSnapshot(vm->add_root_snapshot(), 0, n, texts);
 }
+
+namespace {
 
 int CountNodes(const google::protobuf::RepeatedPtrField<pb::SnapshotState>& nodes) {
     int count = 0;
@@ -171,6 +176,9 @@ void FillHost(pb::HostState* host) {
     host->mutable_prov_policy();
 }
 
+}  // namespace
+
+// Shared with the wire's workloads (twins.h).
 void FillLocation(pb::VmLocation* location) {
     auto setRef = [](pb::MoRef* ref, const char* type, const char* id) {
         ref->set_type(type);
@@ -184,6 +192,8 @@ void FillLocation(pb::VmLocation* location) {
     FillDatastore(location->mutable_primary_datastore(), 0);
     for (int i = 0; i < kDatastores; ++i) FillDatastore(location->add_datastore(), i);
 }
+
+namespace {
 
 void BM_record_get_set(benchmark::State& state) {
     pb::HostState host;

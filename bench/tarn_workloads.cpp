@@ -38,6 +38,9 @@ SnapshotState* MakeSnapshot(int i, int n, const TreeTexts& texts) {
     return node;
 }
 
+}  // namespace
+
+// Shared with the wire's workloads (twins.h).
 Ref<VmState> MakeVmState(int n) {
     const TreeTexts& texts = TextsFor(n);
     Ref<VmState> vm(new VmState(new MoRef(kVmType, kVmId), kVmPathName, Cairn::VirtualMachine::PowerState::poweredOn,
@@ -46,6 +49,8 @@ Ref<VmState> MakeVmState(int n) {
     vm->GetRootSnapshot()->Append(MakeSnapshot(0, n, texts));
     return vm;
 }
+
+namespace {
 
 int CountNodes(const DataArray<SnapshotState>* array) {
     int count = 0;
@@ -131,6 +136,9 @@ Ref<HostState> MakeHost() {
         new Cairn::Vm::ProvisioningPolicy()));
 }
 
+}  // namespace
+
+// Shared with the wire's workloads (twins.h).
 Ref<VmLocation> MakeLocation() {
     Ref<DataArray<DatastoreState>> datastores(new DataArray<DatastoreState>());
     for (int i = 0; i < kDatastores; ++i) datastores->Append(MakeDatastore(i).Get());
@@ -139,6 +147,8 @@ Ref<VmLocation> MakeLocation() {
                                           new MoRef("ResourcePool", "resgroup-8"), MakeHost().Get(),
                                           MakeDatastore(0).Get(), datastores.Get()));
 }
+
+namespace {
 
 int PropertyIndex(const Orbit::DataObjectType* type, const std::string& name) {
     const auto& properties = type->GetProperties();
