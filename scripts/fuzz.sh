@@ -17,7 +17,7 @@ cmake --build --preset fuzz
 
 passed=0
 failed=0
-for target in catalogue data-objects; do
+for target in catalogue data-objects wire; do
   work=build/fuzz/corpus/$target
   artifacts=build/fuzz/artifacts
   mkdir -p "$work" "$artifacts"

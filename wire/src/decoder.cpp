@@ -251,6 +251,7 @@ Decoder::Ns Decoder::Resolve(std::string_view qname, std::string_view& local, bo
     for (auto it = _bindings.rbegin(); it != _bindings.rend(); ++it)
         if (it->prefix == prefix) return it->ns;
     if (prefix.empty()) return Ns::None;
+    if (prefix == "xml") return Ns::Other;  // bound by XML itself
     Fail<MalformedMessage>("the undeclared namespace prefix '" + std::string(prefix) + "'");
 }
 
