@@ -2,6 +2,7 @@
 
 #include "orbit/Dispatch.h"
 #include "orbit/Registry.h"
+#include "schema.h"
 
 namespace Orbit::Wire {
 namespace {
@@ -66,22 +67,19 @@ ORBIT_WIRE_KIND(UnknownMethod)
 ORBIT_WIRE_KIND(UnknownVersion)
 #undef ORBIT_WIRE_KIND
 
-// Registered when the library loads, so that a peer's fault finds its class by name.
-struct Registration {
-    Registration() {
-        TypeMap* map = GetTypeMap();
-        map->AddType(GetType<InvalidRequest>());
-        map->AddType(GetType<MalformedMessage>());
-        map->AddType(GetType<UnknownElement>());
-        map->AddType(GetType<MissingElement>());
-        map->AddType(GetType<InvalidValue>());
-        map->AddType(GetType<LimitExceeded>());
-        map->AddType(GetType<UnknownMethod>());
-        map->AddType(GetType<UnknownVersion>());
-    }
-} gRegistration;
-
 }  // namespace
+
+void RegisterFaultTypes() {
+    static const bool registered = [] {
+        TypeMap* map = GetTypeMap();
+        for (Type* type : {GetType<InvalidRequest>(), GetType<MalformedMessage>(), GetType<UnknownElement>(),
+                           GetType<MissingElement>(), GetType<InvalidValue>(), GetType<LimitExceeded>(),
+                           GetType<UnknownMethod>(), GetType<UnknownVersion>()})
+            map->AddType(type);
+        return true;
+    }();
+    (void)registered;
+}
 
 InvalidRequest::Exception* InvalidRequest::Exception::Clone() const { return new Exception(*this); }
 void InvalidRequest::Exception::Throw() const { throw *this; }

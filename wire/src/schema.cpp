@@ -50,6 +50,7 @@ const Schema& Schema::For(const Version& version) {
     static auto* mutex = new std::mutex();
     static auto* made = new std::unordered_map<const Version*, std::unique_ptr<Schema>>();
     std::lock_guard<std::mutex> lock(*mutex);
+    RegisterFaultTypes();
     std::unique_ptr<Schema>& slot = (*made)[&version];
     if (!slot) slot.reset(new Schema(version));
     return *slot;

@@ -57,6 +57,9 @@ struct MethodTable {
     std::vector<Slot> results;           // the result alone, or nothing
 };
 
+// Adds the wire's fault types to the type map, once; every schema is made after it.
+void RegisterFaultTypes();
+
 // Lets maps keyed by std::string be searched with a std::string_view.
 struct TextHash {
     using is_transparent = void;

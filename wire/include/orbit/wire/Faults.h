@@ -1,7 +1,7 @@
 // The faults of the wire: what a peer hears when its message cannot be read. Each is
 // a runtime fault type with its own record (wire name "strata.wire.<Name>", version
 // "strata.version.version0", so every API version sees it), registered with the type
-// map when the library loads, so that the other end decodes it as its own class.
+// map when the first Codec is made, so that the other end decodes it as its own class.
 //
 //   strata.wire.InvalidRequest      the base; `path` names the offending element
 //     strata.wire.MalformedMessage  not well-formed XML, a DOCTYPE, an entity
