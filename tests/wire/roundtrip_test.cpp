@@ -69,6 +69,28 @@ TEST(WireValues, WhatAVersionDoesNotSeeIsDropped) {
     }
 }
 
+// anyType holds anything: arrays in arrays, enumerations and their arrays, data
+// objects of any class, references, infinities, text that needs escaping.
+TEST(WireValues, AnyTypeCarriesNestedArraysAndEveryKindOfValue) {
+    const Codec codec(*Orbit::GetVersionMap()->GetVersion("tarn.version.dev"));
+    auto* lockMode = Kernite::NarrowToType<Orbit::EnumType, Orbit::Type>(
+        Orbit::GetTypeMap()->GetType("tarn.LockStresser.LockMode"));
+    Ref<Any> mode, modes;
+    lockMode->StringToEnum("sall", mode);
+    Ref<Orbit::Array<std::string>> tags(new Orbit::Array<std::string>{"xall", "s"});
+    lockMode->StringArrayToEnumArray(tags.Get(), modes);
+    Ref<Orbit::DataArray<Any>> inner(new Orbit::DataArray<Any>{
+        new Orbit::Array<int>{-1, 2147483647}, modes.Get(), new Orbit::Array<std::string>{"a & b", " <c> ", ""}});
+    Ref<Orbit::DataArray<Any>> outer(new Orbit::DataArray<Any>{
+        inner.Get(), mode.Get(), new Orbit::Primitive<double>(-1.0 / 0.0), new Orbit::Primitive<double>(0.1),
+        new Orbit::MoRef("tarn.LockStresser", "ls \"1\""),
+        new Orbit::KeyAnyValue("line\r\nbreak\ttab", new Orbit::Array<bool>{true, false}),
+        new Orbit::Array<Kernite::System::DateTime>{Kernite::System::DateTime::FromMicroseconds(-1)}});
+    const std::string xml = codec.EncodeValue(outer.Get());
+    Ref<Any> back = codec.DecodeValue(xml);
+    EXPECT_EQ(Roundtrip::Difference(outer.Get(), back.Get()), "") << xml;
+}
+
 TEST(WireCalls, EveryMemberOfEveryManagedTypeRoundTrips) {
     int calls = 0;
     for (Version* version : TarnVersions()) {
