@@ -89,11 +89,11 @@ const Case kCases[] = {
     {"tag twice", T("enum E" + std::string(kV1) + "\n  tags a b\n  tags a\n"), 3, "tag 'a' is given twice"},
     {"tags of one constant", T("enum E" + std::string(kV1) + "\n  tags ab AB\n"), 3, "gives the same constant"},
     // Members.
-    {"property twice", T(kData + Prop("p", "int") + Prop("p", "int")), 4, "member 'p' is declared twice"},
+    {"property twice", T(kData + Prop("p", "int") + Prop("p", "int")), 4, "member 'p' is declared twice (first at idl/tarn.t.idl:3)"},
     {"method and property of one name", T("managed M" + std::string(kV1) + "\n" + Method("p") + Prop("p", "int")), 4,
      "member 'p' is declared twice"},
     {"parameter twice", T("managed M" + std::string(kV1) + "\n" + Method("m") + "    param a int\n    param a int\n"), 5,
-     "parameter 'a' is declared twice"},
+     "parameter 'a' is declared twice (first at idl/tarn.t.idl:4)"},
     {"task wsdl name", T("managed M" + std::string(kV1) + "\n" + Method("m", " task")), 3, "must end in \"_Task\""},
     {"throws a non-fault", T("managed M" + std::string(kV1) + "\n" + Method("m") + "    throws M\n"), 4, "'M' is not a fault"},
     {"optional int by value", T("managed M" + std::string(kV1) + "\n" + Method("m") + "    param p int flags 2\n"), 4,
@@ -119,7 +119,10 @@ const Case kCases[] = {
      "indented among the members of 'D' (idl/tarn.t.idl:2)"},
     {"flags past 7", T(kData + Prop("p", "int", 8)), 3, "from 0 to 7"},
     {"property without flags", T(kData + "  property p int" + kV1 + "\n"), 3, "states its flags"},
-    {"unknown option", T("data D" + std::string(kV1) + " colour blue\n"), 2, "unexpected 'colour'"},
+    {"unknown option", T("data D" + std::string(kV1) + " colour blue\n"), 2, "unexpected 'colour'; expected one of: :, version"},
+    {"unknown statement", T("struct S\n"), 2, "expected one of: data, enum, fault"},
+    {"documentation of a tags line", T("enum E" + std::string(kV1) + "\n  ## the tags\n  tags a\n"), 3, "not a 'tags' line"},
+    {"documentation of nothing", T(kData + "## dangling\n"), 3, "documents nothing"},
     {"member outside a type", T("  param p int\n"), 2, "outside a method"},
     {"method of a data object", T(kData + Method("m")), 3, "only a managed type has methods"},
     {"second result", T("managed M" + std::string(kV1) + "\n" + Method("m") + "    result int" + kV1 + "\n    result int" + kV1 + "\n"),
@@ -158,6 +161,56 @@ TEST(CatalogueErrors, AValidCatalogueResolves) {
              Prop("name", "string", 4) + "\n" + kData + Prop("items", "D", 3) + "\nenum M.Mode" + kV1 + "\n  tags a b\n"),
            0, "accepted", ""};
     EXPECT_STREQ(Failure(c).what(), ":0: accepted");
+}
+
+// Every error of a run, in file and line order, and no echo of one: the member lines
+// of a type or method line that failed are dropped with it.
+TEST(CatalogueErrors, OneRunReportsEveryError) {
+    Diagnostics parse;
+    ParseFile("idl/tarn.t.idl",
+              T(kData + Prop("p", "int", 9) +                                  // 3: flags
+                "data Bad colour" + kV1 + "\n" + Prop("q", "int", 9) +           // 4: option; 5 dropped
+                "managed M" + kV1 + "\n  method m wsdl" + kV1 + "\n    param a int flags 9\n" +  // 7: method; 8 dropped
+                "  property r int flags 9" + kV1 + "\n"),                        // 9: flags
+              parse);
+    try {
+        parse.Check();
+        FAIL() << "accepted";
+    } catch (const CatalogueError& e) {
+        std::vector<int> lines;
+        for (const std::string& message : e.all) lines.push_back(std::stoi(message.substr(std::string("idl/tarn.t.idl:").size())));
+        EXPECT_EQ(lines, (std::vector<int>{3, 4, 7, 9})) << ::testing::PrintToString(e.all);
+        EXPECT_EQ(e.location.line, 3);
+    }
+
+    std::vector<FileSyntax> files{ParseFile("idl/versions.idl", kVersions), ParseFile("idl/library.idl", "loaders tarn.t\n"),
+                                  ParseFile("idl/tarn.t.idl", T(kData + Prop("p", "Nowhere") + Prop("q", "int") +
+                                                                "data E" + kV1 + "\n" + Prop("r", "Elsewhere")))};
+    try {
+        Resolve(std::move(files));
+        FAIL() << "accepted";
+    } catch (const CatalogueError& e) {
+        ASSERT_EQ(e.all.size(), 2u) << ::testing::PrintToString(e.all);
+        EXPECT_NE(e.all[0].find("idl/tarn.t.idl:3: unknown type 'Nowhere'"), std::string::npos) << e.all[0];
+        EXPECT_NE(e.all[1].find("idl/tarn.t.idl:6: unknown type 'Elsewhere'"), std::string::npos) << e.all[1];
+    }
+}
+
+// "##" lines belong to the statement after them, blank lines between allowed.
+TEST(CatalogueDocumentation, TravelsToTheModel) {
+    std::vector<FileSyntax> files{
+        ParseFile("idl/versions.idl", kVersions), ParseFile("idl/library.idl", "loaders tarn.t\n"),
+        ParseFile("idl/tarn.t.idl", T("## A manager.\n##\n## Second paragraph.\n\nmanaged M" + std::string(kV1) +
+                                      "\n  ## Runs.\n" + Method("run") + "    ## What to run.\n    param what string\n" +
+                                      "    param how int\n  ## The name.  \n" + Prop("name", "string", 4)))};
+    Model model = Resolve(std::move(files));
+    const Type& m = *model.byWireName.at("tarn.t.M");
+    EXPECT_EQ(m.doc, (Doc{"A manager.", "", "Second paragraph."}));
+    ASSERT_EQ(m.methods.size(), 1u);
+    EXPECT_EQ(m.methods[0].doc, Doc{"Runs."});
+    EXPECT_EQ(m.methods[0].params[0].doc, Doc{"What to run."});
+    EXPECT_TRUE(m.methods[0].params[1].doc.empty());
+    EXPECT_EQ(m.properties[0].doc, Doc{"The name."});
 }
 
 }  // namespace

@@ -31,7 +31,7 @@ std::string DoublesHeaderPath(const Unit& unit) { return unit.outputDir + "/doub
 
 std::string EmitDoublesHeader(const Model&, const Unit& unit) {
     Printer out;
-    out.Raw(Banner(unit.file));
+    out.Raw(Banner(unit.source));
     out.Print("#pragma once\n\n#include \"$h$\"\n#include \"tarn/testing/Double.h\"\n", {{"h", unit.header}});
     for (const Type* t : ManagedTypes(unit))
         if (!t->base->runtime && t->base->unit != &unit) out.Print("#include \"$h$\"\n", {{"h", DoublesHeaderPath(*t->base->unit)}});
@@ -51,7 +51,7 @@ std::string EmitDoublesHeader(const Model&, const Unit& unit) {
 
 std::string EmitDoubles(const Model&, const Unit& unit) {
     Printer out;
-    out.Raw(Banner(unit.file));
+    out.Raw(Banner(unit.source));
     out.Print("#include \"$h$\"\n", {{"h", DoublesHeaderPath(unit)}});
     std::vector<const Type*> types = ManagedTypes(unit);
     for (const Type* t : types) {
@@ -106,7 +106,7 @@ std::string EmitDoubles(const Model&, const Unit& unit) {
 
 std::string EmitDoublesUmbrella(const Model& model) {
     Printer out;
-    out.Raw(Banner("idl/library.idl"));
+    out.Raw(Banner("the catalogue's loader order"));
     out.Raw("// The test doubles of every namespace.\n#pragma once\n\n");
     for (const Unit* unit : model.Units(false)) out.Print("#include \"$h$\"\n", {{"h", DoublesHeaderPath(*unit)}});
     return out.Text();

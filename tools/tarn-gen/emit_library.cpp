@@ -1,23 +1,32 @@
 // Library-wide files: the version list every loader registers, and the umbrella header.
 #include "emit.h"
+#include "names.h"
 #include "printer.h"
 
 namespace tarngen {
 
-std::string EmitVersionsHeader(const Model&) {
-    return Banner("idl/versions.idl") +
-           "#pragma once\n\n#include \"orbit/Registry.h\"\n\n"
-           "namespace Tarn {\n\n"
-           "// Declares every catalogued version, then for each its full set of included versions\n"
-           "// (itself among them) in registration order, as each namespace's loader must.\n"
-           "void RegisterVersions(Orbit::VersionMap* versionMap);\n\n"
-           "}  // namespace Tarn\n";
+std::string LibraryFile(const Model& model, const std::string& name) { return model.root + "/" + name; }
+
+std::string VersionsFunction(const Model& model) { return names::Capitalise(model.root) + "::RegisterVersions"; }
+
+std::string EmitVersionsHeader(const Model& model) {
+    Printer out;
+    out.Raw(Banner("the catalogue's version list"));
+    out.Print("#pragma once\n\n#include \"orbit/Registry.h\"\n\n"
+              "namespace $ns$ {\n\n"
+              "// Declares every catalogued version, then for each its full set of included versions\n"
+              "// (itself among them) in registration order, as each namespace's loader must.\n"
+              "void RegisterVersions(Orbit::VersionMap* versionMap);\n\n"
+              "}  // namespace $ns$\n",
+              {{"ns", names::Capitalise(model.root)}});
+    return out.Text();
 }
 
 std::string EmitVersions(const Model& model) {
     Printer out;
-    out.Raw(Banner("idl/versions.idl"));
-    out.Raw("#include \"tarn/versions.h\"\n\n#include <cstddef>\n#include <string>\n\nnamespace {\n\n"
+    out.Raw(Banner("the catalogue's version list"));
+    out.Print("#include \"$h$\"\n\n#include <cstddef>\n#include <string>\n\nnamespace {\n\n", {{"h", LibraryFile(model, "versions.h")}});
+    out.Raw(""
             "struct VersionRow {\n    const char* name;\n    const char* serviceNamespace;\n    const char* versionId;\n"
             "    unsigned int flag;\n};\n\n"
             "constexpr VersionRow kVersions[] = {\n");
@@ -46,7 +55,9 @@ std::string EmitVersions(const Model& model) {
             "            serviceNamespace[i] = kVersions[i].serviceNamespace;\n"
             "            versionId[i] = kVersions[i].versionId;\n"
             "        }\n    }\n};\n\n}  // namespace\n\n"
-            "void Tarn::RegisterVersions(Orbit::VersionMap* versionMap) {\n"
+            "void ");
+    out.Raw(VersionsFunction(model));
+    out.Raw("(Orbit::VersionMap* versionMap) {\n"
             "    static const VersionStrings strings;\n"
             "    for (std::size_t i = 0; i < VersionStrings::kCount; ++i)\n"
             "        versionMap->AddVersion(strings.name[i], strings.serviceNamespace[i], strings.versionId[i], kVersions[i].flag,\n"
@@ -59,7 +70,7 @@ std::string EmitVersions(const Model& model) {
 
 std::string EmitUmbrella(const Model& model) {
     Printer out;
-    out.Raw(Banner("idl/library.idl"));
+    out.Raw(Banner("the catalogue's loader order"));
     out.Raw("// Every namespace of the library.\n#pragma once\n\n");
     for (const Unit* unit : model.Units(false)) out.Print("#include \"$h$\"\n", {{"h", unit->header}});
     return out.Text();

@@ -36,7 +36,7 @@ void StubMembers(Printer& out, const Unit& unit, const Type& t) {
 
 std::string EmitStub(const Model&, const Unit& unit) {
     Printer out;
-    out.Raw(Banner(unit.file));
+    out.Raw(Banner(unit.source));
     out.Print("#include \"$h$\"\n", {{"h", unit.header}});
     bool any = false;
     for (const Type* t : unit.types) {

@@ -23,7 +23,7 @@ public:
     TypeinfoEmitter(const Model& model, const Unit& unit) : _model(model), _unit(unit) {}
 
     std::string Run() {
-        _out.Raw(Banner(_unit.file));
+        _out.Raw(Banner(_unit.source));
         Includes();
         _out.Raw("\n// Header records.\n");
         for (const Type* t : _unit.types)
@@ -65,7 +65,7 @@ private:
         headers.erase(_unit.header);
         _out.Print("#include \"$h$\"\n\n", {{"h", _unit.header}});
         for (const std::string& h : headers) _out.Print("#include \"$h$\"\n", {{"h", h}});
-        if (!_unit.standin) _out.Raw("#include \"tarn/versions.h\"\n");
+        if (!_unit.standin) _out.Print("#include \"$h$\"\n", {{"h", LibraryFile(_model, "versions.h")}});
     }
 
     void Section(const Type& t) { _out.Print("\n// $kind$ $wire$\n", {{"kind", KindName(t.kind)}, {"wire", t.wireName}}); }
@@ -324,12 +324,13 @@ private:
     // ---- Loader ----
 
     void Loader() {
-        Printer::Vars vars = {{"loader", _unit.loaderClass}, {"path", Quote(_unit.sourcePath + "/typeinfo")}};
+        Printer::Vars vars = {{"loader", _unit.loaderClass}, {"path", Quote(_unit.sourcePath + "/typeinfo")},
+                              {"versions", VersionsFunction(_model)}};
         _out.Print("\nOrbit::$loader$::$loader$() {\n", vars);
         if (!_unit.standin) {
             _out.Print("    Orbit::VersionMap* versionMap = Orbit::GetVersionMap();\n"
                        "    if (!(versionMap != nullptr)) Kernite::PanicAssert(\"versionMap != __null\", $path$, __LINE__);\n"
-                       "    Tarn::RegisterVersions(versionMap);\n",
+                       "    $versions$(versionMap);\n",
                        vars);
         }
         _out.Print("    Orbit::TypeMap* typeMap = Orbit::GetTypeMap();\n"

@@ -1,8 +1,5 @@
-# tarn_generate(<prefix> IDL <catalogue dir> OUT <output dir>) runs the generator
-# over a catalogue during the build. The generator itself says which files a run
-# writes (tarn-gen --list, at configure time); they come back as
-# <prefix>_TYPES_SOURCES, <prefix>_STANDINS_SOURCES, <prefix>_TESTING_SOURCES, and
-# the target <prefix>-generated makes them all.
+# The project's own use of tarn_generate: builds the generator as a host tool and
+# points TARN_GEN at it (the top level sets TARN_RUNTIME).
 include_guard(GLOBAL)
 
 # The generator is a host tool, built before any catalogue is listed, without the
@@ -15,6 +12,7 @@ else()
   set(TARN_GEN_HOST_DIR ${CMAKE_BINARY_DIR}/tarn-gen-host)
 endif()
 set(TARN_GEN ${TARN_GEN_HOST_DIR}/tarn-gen CACHE INTERNAL "the host generator")
+
 file(GLOB tarn_gen_sources CONFIGURE_DEPENDS ${CMAKE_CURRENT_LIST_DIR}/*.cpp ${CMAKE_CURRENT_LIST_DIR}/*.h)
 set_property(DIRECTORY ${PROJECT_SOURCE_DIR} APPEND PROPERTY CMAKE_CONFIGURE_DEPENDS
              ${tarn_gen_sources} ${CMAKE_CURRENT_LIST_DIR}/CMakeLists.txt
@@ -25,7 +23,7 @@ if(TARN_WERROR)
 endif()
 execute_process(
   COMMAND ${CMAKE_COMMAND} -S ${CMAKE_CURRENT_LIST_DIR} -B ${TARN_GEN_HOST_DIR} -G ${CMAKE_GENERATOR}
-          -DCMAKE_CXX_COMPILER_LAUNCHER=${CMAKE_CXX_COMPILER_LAUNCHER} -DCMAKE_CXX_FLAGS=${tarn_gen_flags}
+          -DCMAKE_CXX_COMPILER_LAUNCHER=${CMAKE_CXX_COMPILER_LAUNCHER} -DCMAKE_CXX_FLAGS=${tarn_gen_flags} -DTARN_VERSION=${PROJECT_VERSION}
   RESULT_VARIABLE status OUTPUT_VARIABLE log ERROR_VARIABLE log)
 if(status EQUAL 0)
   execute_process(COMMAND ${CMAKE_COMMAND} --build ${TARN_GEN_HOST_DIR}
@@ -35,26 +33,4 @@ if(NOT status EQUAL 0)
   message(FATAL_ERROR "building the generator failed:\n${log}")
 endif()
 
-function(tarn_generate prefix)
-  cmake_parse_arguments(arg "" "IDL;OUT" "" ${ARGN})
-  # Only to notice a catalogue file added or removed; the generator names what it read.
-  file(GLOB_RECURSE present CONFIGURE_DEPENDS ${arg_IDL}/*)
-  set(list ${CMAKE_CURRENT_BINARY_DIR}/${prefix}-files.cmake)
-  execute_process(COMMAND ${TARN_GEN} --idl ${arg_IDL} --out ${arg_OUT} --list ${list}
-                  RESULT_VARIABLE status ERROR_VARIABLE errors)
-  if(NOT status EQUAL 0)
-    message(FATAL_ERROR "${errors}")
-  endif()
-  include(${list})
-  set_property(DIRECTORY APPEND PROPERTY CMAKE_CONFIGURE_DEPENDS ${TARN_GEN_INPUTS})
-  add_custom_command(
-    OUTPUT ${TARN_GEN_OUTPUTS}
-    COMMAND ${TARN_GEN} --idl ${arg_IDL} --out ${arg_OUT}
-    DEPENDS ${TARN_GEN} ${TARN_GEN_INPUTS}
-    COMMENT "Generating ${prefix} from ${arg_IDL}"
-    VERBATIM)
-  add_custom_target(${prefix}-generated DEPENDS ${TARN_GEN_OUTPUTS})
-  foreach(kind TYPES STANDINS TESTING)
-    set(${prefix}_${kind}_SOURCES ${TARN_GEN_${kind}_SOURCES} PARENT_SCOPE)
-  endforeach()
-endfunction()
+include(${PROJECT_SOURCE_DIR}/cmake/TarnGenerate.cmake)

@@ -22,21 +22,37 @@ const char* KindWord(Kind kind) {
 
 class Resolver {
 public:
+    // Each step reports every error it meets; a step runs only when the steps it
+    // builds on went through, so that one mistake is not reported again as its echoes.
     Model Run(std::vector<FileSyntax>& files) {
         AddRuntimeTypes();
         for (FileSyntax& f : files) ReadVersions(f);
-        if (_model.versions.empty()) throw CatalogueError({"idl", 0}, "no versions are catalogued");
-        CloseVersions();
-        ReadLoaders(files);
-        for (FileSyntax& f : files) DeclareTypes(f);
+        if (_model.versions.empty() && _diagnostics.Empty()) throw CatalogueError({"idl", 0}, "no versions are catalogued");
+        _diagnostics.Check();
+        Try([&] { CloseVersions(); });
+        Try([&] { ReadLoaders(files); });
+        _diagnostics.Check();
+        for (FileSyntax& f : files) Try([&] { DeclareTypes(f); });
+        _diagnostics.Check();
         for (auto& [type, syntax] : _declared) ResolveType(*type, *syntax);
-        for (auto& [type, syntax] : _declared) CheckBaseChain(*type, *syntax);
+        _diagnostics.Check();
+        for (auto& [type, syntax] : _declared) Try([&] { CheckBaseChain(*type, *syntax); });
         for (auto& [type, syntax] : _declared)
-            if (type->kind == Kind::Managed) CheckMemberNames(*type);
+            if (type->kind == Kind::Managed) Try([&] { CheckMemberNames(*type); });
+        _diagnostics.Check();
         return std::move(_model);
     }
 
 private:
+    template <class Step>
+    void Try(Step step) {
+        try {
+            step();
+        } catch (const CatalogueError& e) {
+            _diagnostics.Add(e);
+        }
+    }
+
     // The runtime's own types that a catalogue may name but not redeclare, from the
     // runtime's table; primitives are keywords instead (see Primitives()).
     void AddRuntimeTypes() {
@@ -59,7 +75,11 @@ private:
 
     void ReadVersions(const FileSyntax& file) {
         for (const VersionSyntax& v : file.versions) {
-            if (_versionIndex.count(v.name)) throw CatalogueError(v.where, "version '" + v.name + "' is declared twice");
+            if (auto it = _versionIndex.find(v.name); it != _versionIndex.end()) {
+                _diagnostics.Add(CatalogueError(v.where, "version '" + v.name + "' is declared twice (first at " +
+                                                             _model.versions[it->second].where.ToString() + ")"));
+                continue;
+            }
             _versionIndex[v.name] = static_cast<int>(_model.versions.size());
             Version version;
             version.where = v.where;
@@ -114,6 +134,7 @@ private:
             listing = &f;
         }
         if (!listing) throw CatalogueError({"idl", 0}, "no 'loaders' statement gives the loader order");
+        _model.root = names::Segments(listing->loaders.front()).front();
         std::set<std::string> namespaces;
         for (const FileSyntax& f : files)
             if (!f.standin && !f.unit.empty()) namespaces.insert(f.unit);
@@ -133,12 +154,13 @@ private:
                 throw CatalogueError({file.path, 1}, "'" + file.unit + "' is also catalogued in " + unit->file);
         auto unit = std::make_unique<Unit>();
         unit->file = file.path;
+        unit->source = file.source.empty() ? file.path : file.source;
         unit->name = file.unit;
         unit->standin = file.standin;
         unit->flatName = names::Flat(file.unit);
         unit->outputDir = names::SourceDir(file.unit);
-        unit->header = file.unit.find('.') == std::string::npos ? unit->outputDir + "/" + file.unit + ".h"
-                                                                 : unit->outputDir + ".h";
+        unit->header = names::Header(file.unit);
+        unit->detailHeader = names::DetailHeader(unit->header);
         unit->sourcePath = unit->outputDir;
         unit->loaderClass = names::Loader(file.unit);
         unit->loadOrder = file.standin ? 0 : _loadOrder.at(file.unit);
@@ -155,9 +177,14 @@ private:
     void DeclareTypes(FileSyntax& file) {
         if (file.unit.empty()) return;
         Unit* unit = MakeUnit(file);
-        for (TypeSyntax& syntax : file.types) {
+        for (TypeSyntax& syntax : file.types) Try([&] { DeclareType(unit, syntax); });
+    }
+
+    void DeclareType(Unit* unit, TypeSyntax& syntax) {
+        {
             auto type = std::make_unique<Type>();
             type->where = syntax.where;
+            type->doc = syntax.doc;
             type->kind = syntax.kind;
             type->unit = unit;
             type->wireName = syntax.ns + "." + syntax.name;
@@ -200,6 +227,12 @@ private:
     }
 
     void ResolveType(Type& type, const TypeSyntax& syntax) {
+        Try([&] { ResolveShape(type, syntax); });
+        ResolveMembers(type, syntax);
+    }
+
+    // Outer type, base and tags.
+    void ResolveShape(Type& type, const TypeSyntax& syntax) {
         const std::string& ns = syntax.ns;
         // Outer type of a nested type.
         std::vector<std::string> path = names::Segments(syntax.name);
@@ -230,18 +263,29 @@ private:
                     throw CatalogueError(syntax.tagsWhere, "tag '" + tag + "' gives the same constant as another tag");
             }
         }
-        std::set<std::string> memberNames;
+    }
+
+    void ResolveMembers(Type& type, const TypeSyntax& syntax) {
+        const std::string& ns = syntax.ns;
+        std::map<std::string, Location> memberNames;
+        auto claim = [&](const std::string& name, const Location& where) {
+            auto [it, fresh] = memberNames.emplace(name, where);
+            if (!fresh) throw CatalogueError(where, "member '" + name + "' is declared twice (first at " + it->second.ToString() + ")");
+        };
         int number = 0;
         for (const MethodSyntax& m : syntax.methods) {
-            if (!memberNames.insert(m.name).second) throw CatalogueError(m.where, "member '" + m.name + "' is declared twice");
-            type.methods.push_back(ResolveMethod(ns, m));
-            type.methods.back().memberNumber = number++;
+            Try([&] {
+                claim(m.name, m.where);
+                type.methods.push_back(ResolveMethod(ns, m));
+                type.methods.back().memberNumber = number++;
+            });
         }
         int index = 0;
-        for (const PropertySyntax& p : syntax.properties) {
-            if (!memberNames.insert(p.name).second) throw CatalogueError(p.where, "member '" + p.name + "' is declared twice");
+        for (const PropertySyntax& p : syntax.properties) Try([&] {
+            claim(p.name, p.where);
             Property property;
             property.where = p.where;
+            property.doc = p.doc;
             property.name = p.name;
             property.type = Reference(p.where, ns, p.type);
             property.flags = p.flags;
@@ -252,12 +296,13 @@ private:
             CheckVersion(p.where, p.version);
             if (type.kind == Kind::Managed) CheckDelivered(p.where, property.type, p.flags, "property");
             type.properties.push_back(std::move(property));
-        }
+        });
     }
 
     Method ResolveMethod(const std::string& ns, const MethodSyntax& m) {
         Method method;
         method.where = m.where;
+        method.doc = m.doc;
         method.name = m.name;
         method.operation = names::Capitalise(m.name);
         method.wsdlName = m.wsdlName.value_or(m.name);
@@ -265,11 +310,13 @@ private:
         method.task = m.task;
         method.privilege = m.privilege.value_or("");
         CheckVersion(m.where, m.version);
-        std::set<std::string> paramNames;
+        std::map<std::string, Location> paramNames;
         for (const ParamSyntax& p : m.params) {
-            if (!paramNames.insert(p.name).second) throw CatalogueError(p.where, "parameter '" + p.name + "' is declared twice");
+            if (auto [it, fresh] = paramNames.emplace(p.name, p.where); !fresh)
+                throw CatalogueError(p.where, "parameter '" + p.name + "' is declared twice (first at " + it->second.ToString() + ")");
             Param param;
             param.where = p.where;
+            param.doc = p.doc;
             param.name = p.name;
             param.type = Reference(p.where, ns, p.type);
             param.flags = p.flags;
@@ -370,6 +417,7 @@ private:
     std::map<std::string, int> _loadOrder;
     std::map<Kind, const Type*> _roots;
     std::vector<std::pair<Type*, const TypeSyntax*>> _declared;
+    Diagnostics _diagnostics;
 };
 
 }  // namespace

@@ -48,6 +48,7 @@ struct TypeRef {
 
 struct Property {
     Location where;
+    Doc doc;
     std::string name;
     TypeRef type;
     std::uint32_t flags = 0;
@@ -62,6 +63,7 @@ struct Property {
 
 struct Param {
     Location where;
+    Doc doc;
     std::string name;
     TypeRef type;
     std::uint32_t flags = 0;
@@ -71,6 +73,7 @@ struct Param {
 
 struct Method {
     Location where;
+    Doc doc;
     std::string name;       // as catalogued, "reloadSslCertificate"
     std::string operation;  // C++ name, "ReloadSslCertificate"
     std::string wsdlName;
@@ -86,6 +89,7 @@ struct Method {
 
 struct Type {
     Location where;
+    Doc doc;
     Kind kind = Kind::Data;
     Unit* unit = nullptr;
     bool runtime = false;           // owned by the runtime (strata.DynamicData and friends)
@@ -112,12 +116,14 @@ struct Type {
 
 // What one generated file set holds: a catalogue namespace, or a stand-in library.
 struct Unit {
-    std::string file;
+    std::string file;          // as messages name it
+    std::string source;        // as generated files name it: "idl/tarn.vmprov.idl"
     std::string name;          // "tarn.vmprov", "tarn", "cairn"
     bool standin = false;
     std::string flatName;      // "TarnVmprov"
     std::string outputDir;     // "tarn/vmprov", "tarn", "cairn"
     std::string header;        // "tarn/vmprov.h", "tarn/tarn.h", "cairn/cairn.h"
+    std::string detailHeader;  // records and loader: "tarn/detail/vmprov.h", "cairn/detail/cairn.h"
     std::string sourcePath;    // "tarn/vmprov" (the prefix of "…/typeinfo" and "…/stub")
     std::string loaderClass;   // "TarnVmprovTypeinfoTypeInfoLoader"
     int loadOrder = 0;         // position among the units of its library
@@ -141,6 +147,10 @@ struct Version {
 };
 
 struct Model {
+    // The catalogue's root namespace, from the first namespace of the loader order:
+    // "tarn". It names the library-wide files ("tarn/versions.h") and the C++
+    // namespace of the version registration ("Tarn::RegisterVersions").
+    std::string root;
     std::vector<Version> versions;
     std::vector<std::unique_ptr<Unit>> units;    // tarn units in load order, then stand-ins
     std::vector<std::unique_ptr<Type>> types;    // every type, runtime ones included

@@ -80,4 +80,14 @@ std::string SourceDir(const std::string& unitName) {
     return out;
 }
 
+std::string Header(const std::string& unitName) {
+    std::string dir = SourceDir(unitName);
+    return unitName.find('.') == std::string::npos ? dir + "/" + unitName + ".h" : dir + ".h";
+}
+
+std::string DetailHeader(const std::string& header) {
+    std::size_t slash = header.rfind('/');
+    return header.substr(0, slash + 1) + "detail/" + header.substr(slash + 1);
+}
+
 }  // namespace tarngen::names

@@ -36,5 +36,9 @@ std::string Member(const std::string& property);
 std::string Identifier(const std::string& name);
 // "tarn.vmprov" -> "tarn/vmprov"; "tarn" -> "tarn"
 std::string SourceDir(const std::string& unitName);
+// "tarn.vmprov" -> "tarn/vmprov.h"; "tarn" -> "tarn/tarn.h"; "cairn" -> "cairn/cairn.h"
+std::string Header(const std::string& unitName);
+// "tarn/vmprov.h" -> "tarn/detail/vmprov.h"
+std::string DetailHeader(const std::string& header);
 
 }  // namespace tarngen::names

@@ -1,7 +1,9 @@
 // Line-based parser of the catalogue format (see idl/README.md).
 #include <map>
+#include <optional>
 #include <set>
 #include <sstream>
+#include <utility>
 
 #include "syntax.h"
 
@@ -62,7 +64,13 @@ public:
                 if (_next >= _words.size()) Fail("'" + key + "' needs a value");
                 _values[key] = _words[_next++];
             } else {
-                Fail("unexpected '" + key + "'");
+                std::set<std::string> allowed = keys;
+                allowed.insert(switches.begin(), switches.end());
+                if (!rest.empty()) allowed.insert(rest);
+                if (allowed.empty()) Fail("unexpected '" + key + "'; nothing more belongs on this line");
+                std::string list;
+                for (const std::string& word : allowed) list += (list.empty() ? "" : ", ") + word;
+                Fail("unexpected '" + key + "'; expected one of: " + list);
             }
         }
     }
@@ -120,7 +128,7 @@ public:
     // A type line directly between member lines of one indentation looks pasted there:
     // the members below it silently change owner. Said, not refused.
     void WarnIfAmongMembers(const Statement& s, int before, int after) {
-        if (before <= 0 || before != after || _file.types.empty()) return;
+        if (before <= 0 || before != after || _file.types.empty() || _skipping) return;
         const TypeSyntax& above = _file.types.back();
         _file.warnings.push_back(s.Where().ToString() + ": warning: type line among the members of '" + above.name +
                                  "' (" + above.where.ToString() + "); the member lines below it now belong to it");
@@ -143,10 +151,33 @@ public:
         if (keyword == "param") return Param(s);
         if (keyword == "result") return Result(s);
         if (keyword == "throws") return Throws(s);
-        s.Fail("unknown statement '" + keyword + "'");
+        s.Fail("unknown statement '" + keyword + "'; expected one of: data, enum, fault, loaders, managed, method, "
+               "namespace, param, property, result, standin, tags, throws, version");
     }
 
-    FileSyntax Finish() { return std::move(_file); }
+    // "##" lines before a statement document what it declares.
+    void TakeDoc(Doc doc) { _doc = std::move(doc); }
+
+    // After a type or method line that failed, its member lines would land on the
+    // type or method above: they are dropped instead.
+    void Failed(const std::string& keyword) {
+        if (keyword == "method") {
+            _method = nullptr;
+            _skippingMethod = true;
+        }
+        if (keyword != "data" && keyword != "fault" && keyword != "managed" && keyword != "enum") return;
+        if (!_skipping) {
+            _file.types.emplace_back();
+            _file.types.back().kind = Kind::Managed;
+        }
+        _skipping = true;
+        _method = nullptr;
+    }
+
+    FileSyntax Finish() {
+        if (_skipping) _file.types.pop_back();
+        return std::move(_file);
+    }
 
 private:
     void Namespace(Statement& s) {
@@ -192,6 +223,10 @@ private:
     }
 
     void Type(Statement& s, Kind kind) {
+        if (_skipping) {
+            _file.types.pop_back();
+            _skipping = false;
+        }
         if (_ns.empty()) s.Fail("a stand-in file needs a 'namespace' before its types");
         // An indented type line reads as one more member of the type above, yet takes
         // every member line below it.
@@ -210,14 +245,19 @@ private:
             t.base = *base;
         }
         t.version = s.Required("version");
+        t.doc = TakeDocFor(s);
         _file.types.push_back(std::move(t));
         _method = nullptr;
+        _skippingMethod = false;
     }
 
     TypeSyntax& CurrentType(Statement& s, const char* what) {
         if (_file.types.empty()) s.Fail(std::string("'") + what + "' outside a type");
+        if (_skipping) throw Skipped{};
         return _file.types.back();
     }
+
+    Doc TakeDocFor(const Statement&) { return std::exchange(_doc, {}); }
 
     void Property(Statement& s) {
         TypeSyntax& t = CurrentType(s, "property");
@@ -231,8 +271,10 @@ private:
         p.flags = s.Number("flags", kMaxFlags, 0);
         p.version = s.Required("version");
         p.privilege = s.Value("privilege");
+        p.doc = TakeDocFor(s);
         t.properties.push_back(std::move(p));
         _method = nullptr;
+        _skippingMethod = false;
     }
 
     void Tags(Statement& s) {
@@ -258,11 +300,14 @@ private:
         m.version = s.Required("version");
         m.privilege = s.Value("privilege");
         m.task = s.Switch("task");
+        m.doc = TakeDocFor(s);
         t.methods.push_back(std::move(m));
+        _skippingMethod = false;
         _method = &t.methods.back();
     }
 
     MethodSyntax& CurrentMethod(Statement& s, const char* what) {
+        if (_skipping || _skippingMethod) throw Skipped{};
         if (_method == nullptr) s.Fail(std::string("'") + what + "' outside a method");
         return *_method;
     }
@@ -276,6 +321,7 @@ private:
         s.Options({"flags", "version"});
         p.flags = s.Number("flags", kMaxFlags, 0);
         p.version = s.Value("version");
+        p.doc = TakeDocFor(s);
         m.params.push_back(std::move(p));
     }
 
@@ -301,11 +347,35 @@ private:
     FileSyntax _file;
     std::string _ns;
     MethodSyntax* _method = nullptr;
+    Doc _doc;
+    bool _skipping = false;        // the last type line failed: its members are dropped
+    bool _skippingMethod = false;  // the last method line failed: its parameters are dropped
+
+public:
+    // A member line of a type line that failed, dropped without a word.
+    struct Skipped {};
 };
+
+// "## text" -> "text"; nullopt for a line that is not a documentation line.
+std::optional<std::string> DocLine(const std::string& line) {
+    std::size_t start = line.find_first_not_of(" \t");
+    if (start == std::string::npos || line.compare(start, 2, "##") != 0) return std::nullopt;
+    std::string text = line.substr(start + 2);
+    if (!text.empty() && text[0] == ' ') text.erase(0, 1);
+    while (!text.empty() && (text.back() == ' ' || text.back() == '\r')) text.pop_back();
+    return text;
+}
 
 }  // namespace
 
 FileSyntax ParseFile(const std::string& path, const std::string& text) {
+    Diagnostics diagnostics;
+    FileSyntax file = ParseFile(path, text, diagnostics);
+    diagnostics.Check();
+    return file;
+}
+
+FileSyntax ParseFile(const std::string& path, const std::string& text, Diagnostics& diagnostics) {
     Parser parser(path);
     std::istringstream in(text);
     std::vector<std::string> lines;
@@ -314,15 +384,40 @@ FileSyntax ParseFile(const std::string& path, const std::string& text) {
     std::vector<int> indent(lines.size(), -1);
     for (std::size_t i = 0; i < lines.size(); ++i)
         if (!SplitWords(lines[i]).empty()) indent[i] = static_cast<int>(lines[i].find_first_not_of(" \t"));
+    static const std::set<std::string> typeWords = {"data", "fault", "managed", "enum"};
+    static const std::set<std::string> documented = {"data", "fault", "managed", "enum", "property", "method", "param"};
+    Doc doc;
+    Location docWhere;
     for (std::size_t i = 0; i < lines.size(); ++i) {
+        Location where{path, static_cast<int>(i) + 1};
+        if (auto line = DocLine(lines[i])) {
+            if (doc.empty()) docWhere = where;
+            doc.push_back(*line);
+            continue;
+        }
         std::vector<std::string> words = SplitWords(lines[i]);
         if (words.empty()) continue;
-        Statement statement(Location{path, static_cast<int>(i) + 1}, std::move(words), indent[i] > 0);
-        static const std::set<std::string> typeWords = {"data", "fault", "managed", "enum"};
-        if (indent[i] == 0 && typeWords.count(statement.Keyword()) && i > 0 && i + 1 < lines.size())
-            parser.WarnIfAmongMembers(statement, indent[i - 1], indent[i + 1]);
-        parser.Line(std::move(statement));
+        Statement statement(where, std::move(words), indent[i] > 0);
+        const std::string keyword = statement.Keyword();
+        bool isType = typeWords.count(keyword) != 0;
+        if (!doc.empty() && !documented.count(keyword)) {
+            diagnostics.Add(CatalogueError(docWhere, "a '##' comment documents the type, property, method or parameter "
+                                                     "on the line after it, not a '" + keyword + "' line"));
+            doc.clear();
+        }
+        try {
+            if (isType && indent[i] == 0 && i > 0 && i + 1 < lines.size())
+                parser.WarnIfAmongMembers(statement, indent[i - 1], indent[i + 1]);
+            parser.TakeDoc(std::exchange(doc, {}));
+            parser.Line(std::move(statement));
+        } catch (const CatalogueError& e) {
+            diagnostics.Add(e);
+            doc.clear();
+            parser.Failed(keyword);
+        } catch (const Parser::Skipped&) {
+        }
     }
+    if (!doc.empty()) diagnostics.Add(CatalogueError(docWhere, "a '##' comment at the end of the file documents nothing"));
     return parser.Finish();
 }
 

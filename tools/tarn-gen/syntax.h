@@ -18,16 +18,43 @@ struct Location {
     std::string ToString() const { return file + ":" + std::to_string(line); }
 };
 
-// Every catalogue error: "file:line: message".
+// Every catalogue error: "file:line: message". One thrown for a whole run holds the
+// first error in its own fields and every error of the run, that one included, in `all`.
 class CatalogueError : public std::runtime_error {
 public:
     CatalogueError(const Location& where, const std::string& message)
         : std::runtime_error(where.ToString() + ": " + message), location(where) {}
     Location location;
+    std::vector<std::string> all;
 };
+
+// Gathers the errors of a run, so that one run reports all of them.
+class Diagnostics {
+public:
+    void Add(const CatalogueError& e) {
+        if (_errors.empty()) _first = e;
+        _errors.push_back(e.what());
+    }
+    bool Empty() const { return _errors.empty(); }
+    // Throws the gathered errors, if any.
+    void Check() const {
+        if (_errors.empty()) return;
+        CatalogueError out = *_first;
+        out.all = _errors;
+        throw out;
+    }
+
+private:
+    std::optional<CatalogueError> _first;
+    std::vector<std::string> _errors;
+};
+
+// The "##" lines standing right before a statement, without the marks.
+using Doc = std::vector<std::string>;
 
 struct ParamSyntax {
     Location where;
+    Doc doc;
     std::string name;
     std::string type;
     std::uint32_t flags = 0;
@@ -43,6 +70,7 @@ struct ResultSyntax {
 
 struct MethodSyntax {
     Location where;
+    Doc doc;
     std::string name;
     std::optional<std::string> wsdlName;
     std::string version;
@@ -55,6 +83,7 @@ struct MethodSyntax {
 
 struct PropertySyntax {
     Location where;
+    Doc doc;
     std::string name;
     std::string type;
     std::uint32_t flags = 0;
@@ -72,6 +101,7 @@ enum class Kind : std::uint32_t {
 
 struct TypeSyntax {
     Location where;
+    Doc doc;
     Kind kind = Kind::Data;
     std::string ns;    // the namespace in force where it was declared
     std::string name;  // relative to ns, dotted when nested
@@ -95,6 +125,7 @@ struct VersionSyntax {
 // One catalogue file: a namespace file, a stand-in file or the version list.
 struct FileSyntax {
     std::string path;
+    std::string source;  // the name generated files give it, when not `path`
     bool standin = false;
     std::string unit;  // the namespace of a namespace file, the library of a stand-in file
     std::vector<TypeSyntax> types;
@@ -104,7 +135,10 @@ struct FileSyntax {
     std::vector<std::string> warnings;  // "file:line: warning: ..."
 };
 
-// Parses one file; throws CatalogueError on the first malformed line.
+// Parses one file. A malformed line is reported to `diagnostics` and skipped (with the
+// member lines of a type line that failed), so that one run finds every bad line.
+FileSyntax ParseFile(const std::string& path, const std::string& text, Diagnostics& diagnostics);
+// The same, throwing every error of the file at once.
 FileSyntax ParseFile(const std::string& path, const std::string& text);
 
 }  // namespace tarngen
