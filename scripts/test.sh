@@ -1,15 +1,18 @@
 #!/usr/bin/env bash
 # Builds and runs the tests: every suite under the default preset (warnings are
-# errors); every suite but the benchmarks under AddressSanitizer with
-# UndefinedBehaviorSanitizer; the concurrency suites (ctest label "concurrency",
-# built by the target concurrency-suites) under ThreadSanitizer; then each fuzzer
-# for a bounded 60 seconds (TARN_FUZZ_SECONDS changes that, 0 skips them). First of
-# all, the test code must stay within half the size of the other code.
+# errors), then the installed package consumed by a project of its own
+# (scripts/package-test.sh); every suite but the benchmarks under AddressSanitizer
+# with UndefinedBehaviorSanitizer; the concurrency suites (ctest label
+# "concurrency", built by the target concurrency-suites) under ThreadSanitizer;
+# the release preset's libraries and benchmarks, built (warnings are errors) and
+# not run; then each fuzzer for a bounded 60 seconds (TARN_FUZZ_SECONDS changes
+# that, 0 skips them). First of all, the test code must stay within half the size
+# of the other code.
 set -euo pipefail
 cd "$(dirname "$0")/.."
-bash scripts/deps.sh
+bash scripts/deps.sh test
 bash scripts/test-share.sh
-for preset in ${TARN_PRESETS:-default asan tsan}; do
+for preset in ${TARN_PRESETS:-default asan tsan release}; do
   echo "== preset $preset"
   case $preset in
   asan)
@@ -22,10 +25,18 @@ for preset in ${TARN_PRESETS:-default asan tsan}; do
     cmake --build --preset tsan --target concurrency-suites
     ctest --preset tsan -j2 -L concurrency
     ;;
+  release)
+    cmake --preset release >/dev/null
+    cmake --build --preset release-libraries
+    ;;
   *)
     cmake --preset "$preset" >/dev/null
     cmake --build --preset "$preset"
     ctest --preset "$preset" -j2
+    if [ "$preset" = default ]; then
+      echo "== installed package"
+      bash scripts/package-test.sh build/default
+    fi
     ;;
   esac
 done

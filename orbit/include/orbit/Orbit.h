@@ -13,3 +13,4 @@
 #include "orbit/Records.h"
 #include "orbit/Registry.h"
 #include "orbit/Type.h"
+#include "orbit/Version.h"
