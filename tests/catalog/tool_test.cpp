@@ -85,7 +85,7 @@ std::pair<std::vector<std::string>, std::vector<std::string>> ParseListing(const
 }
 
 Json Dump(const std::string& extra = "") {
-    Result r = RunTool("dump --json " + extra);
+    Result r = RunTool("dump " + extra);
     EXPECT_EQ(r.status, 0) << r.err;
     EXPECT_EQ(r.err, "");
     return Json::parse(r.out);
@@ -139,9 +139,31 @@ TEST(Tool, ShowsMembersByNumberAndHidesWhatTheVersionDoesNotSee) {
     EXPECT_NE(RunTool("show tarn.LockStresser.LockMode").out.find("2 \"xall\""), std::string::npos);
 }
 
+// Any of a type's names finds it, the flat names that member lists print included,
+// and the page tells how to reach the type from C++ and what it inherits.
+TEST(Tool, ShowFindsATypeByAnyOfItsNames) {
+    Result byWire = RunTool("show tarn.vmprov.FtSyncContext");
+    ASSERT_EQ(byWire.status, 0) << byWire.err;
+    EXPECT_EQ(RunTool("show TarnVmprovFtSyncContext").out, byWire.out);
+    EXPECT_EQ(RunTool("show Tarn::Vmprov::FtSyncContext").out, byWire.out);
+    for (const char* line : {"  C++ class  Tarn::Vmprov::FtSyncContext\n", "  header     #include \"tarn/vmprov.h\"\n",
+                             "  base       tarn.vmprov.MigrateContext <- tarn.vmprov.MobilityContext <- tarn.vmprov.VmContext"
+                             " <- tarn.vmprov.Context <- strata.DynamicData\n",
+                             "\ninherited from tarn.vmprov.MigrateContext:\n", "\ninherited from tarn.vmprov.Context:\n"})
+        EXPECT_NE(byWire.out.find(line), std::string::npos) << line << byWire.out;
+
+    Result standin = RunTool("show CairnVmConfigSpec");
+    ASSERT_EQ(standin.status, 0) << standin.err;
+    EXPECT_TRUE(standin.out.starts_with("cairn.vm.ConfigSpec\n")) << standin.out;
+    EXPECT_NE(standin.out.find("#include \"cairn/cairn.h\""), std::string::npos) << standin.out;
+    EXPECT_NE(standin.out.find("stand-in"), std::string::npos) << standin.out;
+}
+
 // The document has the agreed shape, and every value in it is the runtime's.
 TEST(ToolJson, TheDocumentIsTheRuntimesRegistration) {
-    Json doc = Dump();
+    EXPECT_EQ(Keys(Dump()), (std::vector<std::string>{"loaders", "versions", "types"}));
+    EXPECT_EQ(RunTool("dump --json").out, RunTool("dump").out) << "older scripts ask for JSON";
+    Json doc = Dump("--counters");
     EXPECT_EQ(Keys(doc), (std::vector<std::string>{"loaders", "calls", "versions", "types"}));
     EXPECT_EQ(doc["loaders"].get<std::vector<std::string>>(), LoaderOrder());
     EXPECT_EQ(doc["calls"]["addType"], Orbit::GetTypeMap()->AddTypeCalls());
@@ -210,8 +232,9 @@ TEST(Tool, BadNamesAndBadCommandLinesFailClearly) {
         const char* message;
     };
     const Case cases[] = {
-        {"show tarn.NoSuchType", 1, "'tarn.NoSuchType'"},
-        {"show cairn.TaskInfo", 1, "no tarn type"},
+        {"show tarn.NoSuchType", 1, "no type named 'tarn.NoSuchType'"},
+        {"show tarn.DebugManagr", 1, "did you mean tarn.DebugManager"},
+        {"show debugmanager", 1, "did you mean tarn.DebugManager"},
         {"--api-version tarn.version.version1 show tarn.AlertManager", 1, "not visible to version 'tarn.version.version1'"},
         {"--api-version tarn.version.version99", 1, "no version named 'tarn.version.version99'"},
         {"--api-version tarn.version.version99 dump --json", 1, "tarn.version.version99"},
@@ -219,10 +242,12 @@ TEST(Tool, BadNamesAndBadCommandLinesFailClearly) {
         {"--frobnicate", 2, "unknown option '--frobnicate'"},
         {"--api-version", 2, "needs a version name"},
         {"--api-version tarn.version.version1 --api-version tarn.version.version6", 2, "twice"},
-        {"show", 2, "exactly one wire name"},
-        {"show tarn.DebugManager tarn.LockStresser", 2, "exactly one wire name"},
-        {"dump", 2, "dump --json"},
+        {"show", 2, "exactly one type name"},
+        {"show tarn.DebugManager tarn.LockStresser", 2, "exactly one type name"},
         {"list --json", 2, "--json"},
+        {"list --counters", 2, "--counters goes with 'dump'"},
+        {"html", 2, "needs --out"},
+        {"list --out x", 2, "--out goes with 'html'"},
     };
     for (const Case& c : cases) {
         Result r = RunTool(c.args);
@@ -236,7 +261,7 @@ TEST(Tool, HelpDocumentsEveryCommandAndOption) {
     Result r = RunTool("--help");
     ASSERT_EQ(r.status, 0);
     EXPECT_EQ(r.err, "");
-    for (const char* word : {"list", "show WIRE-NAME", "versions", "dump --json", "--api-version NAME", "Exit status"})
+    for (const char* word : {"list", "show TYPE", "versions", "dump", "--counters", "html --out DIR", "--api-version NAME", "Exit status"})
         EXPECT_NE(r.out.find(word), std::string::npos) << word;
     EXPECT_EQ(RunTool("-h").out, r.out);
     EXPECT_EQ(RunTool("show --help").out, r.out);

@@ -8,12 +8,14 @@
 
 namespace tarncatalog {
 
-enum class Command { List, Show, Versions, Dump, Wsdl, Help, ToolVersion };
+enum class Command { List, Show, Versions, Dump, Wsdl, Html, Help, ToolVersion };
 
 struct Options {
     Command command = Command::List;
     std::string typeName;               // show
     std::optional<std::string> version;  // --api-version
+    bool counters = false;               // dump --counters
+    std::string outDir;                  // html --out
 };
 
 // A command line that does not parse; the message says what is wrong.

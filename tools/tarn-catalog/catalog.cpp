@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cctype>
 
+#include "names.h"
 #include "orbit/Orbit.h"
 
 namespace tarncatalog {
@@ -30,6 +31,7 @@ MemberEntry ReadMember(const Orbit::Member& m, const char* privilege) {
     e.name = m.name;
     e.privilege = Text(privilege);
     e.type = FlatName(m.typeRecord);
+    if (m.typeRecord != nullptr) e.typeWireName = Text(m.typeRecord->name);
     e.flags = m.flags;
     e.version = m.version;
     return e;
@@ -99,6 +101,8 @@ TypeEntry ReadType(Orbit::Type* type, Orbit::Version* seenBy) {
     e.kind = type->GetKind();
     e.version = VersionName(type);
     e.ns = NamespaceOf(e.name);
+    e.className = tarngen::names::ClassPath(e.name);
+    for (Orbit::Type* base = type->GetBaseType(); base != nullptr; base = base->GetBaseType()) e.baseChain.push_back(base->GetName());
     if (auto* managed = dynamic_cast<Orbit::ManagedObjectType*>(type)) {
         ReadManaged(managed, seenBy, e);
     } else if (auto* data = dynamic_cast<Orbit::DataObjectType*>(type)) {
@@ -107,6 +111,38 @@ TypeEntry ReadType(Orbit::Type* type, Orbit::Version* seenBy) {
         enumeration->GetEnumTags(e.tags);
     }
     return e;
+}
+
+// The types of the runtime itself (primitives, arrays, strata roots) are neither
+// tarn types nor stand-ins.
+bool IsStandin(Orbit::Type* type) {
+    std::uint32_t kind = type->GetKind();
+    if (kind != Orbit::Kind::Data && kind != Orbit::Kind::Fault && kind != Orbit::Kind::Managed && kind != Orbit::Kind::Enum)
+        return false;
+    for (const Orbit::RuntimeRecord& row : Orbit::kRuntimeRecords)
+        if (type->GetName() == row.wireName) return false;
+    return true;
+}
+
+std::string Lower(std::string s) {
+    for (char& c : s) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
+    return s;
+}
+
+// Edit distance, for suggestions.
+std::size_t Distance(const std::string& a, const std::string& b) {
+    std::vector<std::size_t> row(b.size() + 1);
+    for (std::size_t j = 0; j <= b.size(); ++j) row[j] = j;
+    for (std::size_t i = 1; i <= a.size(); ++i) {
+        std::size_t diagonal = row[0];
+        row[0] = i;
+        for (std::size_t j = 1; j <= b.size(); ++j) {
+            std::size_t above = row[j];
+            row[j] = std::min({row[j] + 1, row[j - 1] + 1, diagonal + (a[i - 1] == b[j - 1] ? 0 : 1)});
+            diagonal = above;
+        }
+    }
+    return row[b.size()];
 }
 
 }  // namespace
@@ -146,14 +182,59 @@ Catalog ReadCatalog(Orbit::Version* seenBy) {
     // The runtime's own types and the stand-ins of other libraries share the map.
     for (Orbit::Type* type : typeMap->GetTypes()) {
         const std::string& name = type->GetName();
-        if (!name.starts_with(kTarnPrefix)) continue;
+        if (!name.starts_with(kTarnPrefix)) {
+            if (IsStandin(type)) {
+                c.standins.push_back(ReadType(type, seenBy));
+                c.standins.back().standin = true;
+                // A stand-in library's one header holds all its namespaces.
+                c.standins.back().header = tarngen::names::Header(tarngen::names::Segments(name).front());
+            }
+            continue;
+        }
         ++c.registeredTypes;
         std::string ns = NamespaceOf(name);
         if (std::find(c.loaders.begin(), c.loaders.end(), ns) == c.loaders.end()) c.loaders.push_back(ns);
         if (seenBy != nullptr && !type->IsVisible(seenBy)) continue;
         c.types.push_back(ReadType(type, seenBy));
+        c.types.back().header = tarngen::names::Header(ns);
     }
     return c;
+}
+
+const TypeEntry* FindType(const Catalog& catalog, const std::string& name) {
+    for (const auto* list : {&catalog.types, &catalog.standins})
+        for (const TypeEntry& t : *list)
+            if (t.name == name || t.flatName == name || t.className == name) return &t;
+    return nullptr;
+}
+
+std::vector<std::string> CloseNames(const Catalog& catalog, const std::string& name) {
+    std::string wanted = Lower(name);
+    std::vector<std::pair<std::size_t, std::string>> scored;
+    for (const auto* list : {&catalog.types, &catalog.standins}) {
+        for (const TypeEntry& t : *list) {
+            std::size_t best = std::string::npos;
+            for (const std::string* candidate : {&t.name, &t.flatName, &t.className}) {
+                std::string lower = Lower(*candidate);
+                // A name given without its namespace is close to the full one.
+                if (lower.ends_with("." + wanted) || lower.ends_with("::" + wanted)) best = 0;
+                best = std::min(best, Distance(lower, wanted));
+            }
+            if (best <= std::max<std::size_t>(2, wanted.size() / 4)) scored.emplace_back(best, t.name);
+        }
+    }
+    std::stable_sort(scored.begin(), scored.end(), [](const auto& a, const auto& b) { return a.first < b.first; });
+    std::vector<std::string> out;
+    for (const auto& [score, candidate] : scored)
+        if (out.size() < 3) out.push_back(candidate);
+    return out;
+}
+
+std::vector<const TypeEntry*> Ancestors(const Catalog& catalog, const TypeEntry& type) {
+    std::vector<const TypeEntry*> out;
+    for (const std::string& base : type.baseChain)
+        if (const TypeEntry* t = FindType(catalog, base)) out.push_back(t);
+    return out;
 }
 
 }  // namespace tarncatalog

@@ -18,6 +18,7 @@ struct MemberEntry {
     std::string name;
     std::optional<std::string> privilege;
     std::optional<std::string> type;  // none for a void result
+    std::optional<std::string> typeWireName;
     std::uint32_t flags = 0;
     std::string version;
     int memberNumber = -1;  // properties only: the record-function index or the member number
@@ -38,10 +39,14 @@ struct MethodEntry {
 struct TypeEntry {
     std::string name;
     std::string flatName;
+    std::string className;  // "Tarn::DebugManager::TraceResult"
+    std::string header;     // to include: "tarn/tarn.h"
+    bool standin = false;   // a stand-in for another library's type
     std::uint32_t kind = 0;
     std::string version;
     std::string ns;
     std::optional<std::string> base;  // none for enumerations
+    std::vector<std::string> baseChain;  // wire names, the direct base first, up to the runtime's root
     std::vector<MemberEntry> properties;
     std::vector<MethodEntry> methods;  // managed types only
     std::vector<std::string> tags;     // enumerations only
@@ -68,6 +73,7 @@ struct Catalog {
     Calls calls;
     std::vector<VersionEntry> versions;
     std::vector<TypeEntry> types;       // type-map registration order
+    std::vector<TypeEntry> standins;    // the other libraries' types the records name
     int registeredTypes = 0;            // tarn types in the map, visible or not
 };
 
@@ -81,5 +87,13 @@ Orbit::Version* FindVersion(const std::string& name);
 // Walks the maps. With `seenBy`, keeps only the types, properties, methods and
 // versions that version includes.
 Catalog ReadCatalog(Orbit::Version* seenBy);
+
+// A tarn or stand-in type by wire name, flat name or C++ class name; null if none.
+const TypeEntry* FindType(const Catalog& catalog, const std::string& name);
+// Up to three registered names close to a mistyped one, closest first.
+std::vector<std::string> CloseNames(const Catalog& catalog, const std::string& name);
+// The bases of `type` that the catalog holds, the direct base first, each with the
+// members `type` inherits from it.
+std::vector<const TypeEntry*> Ancestors(const Catalog& catalog, const TypeEntry& type);
 
 }  // namespace tarncatalog

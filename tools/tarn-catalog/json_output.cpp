@@ -192,23 +192,37 @@ void Type(JsonWriter& w, const TypeEntry& t) {
     w.EndObject();
 }
 
+void WriteCalls(JsonWriter& w, const Calls& calls);
+void WriteRest(JsonWriter& w, const Catalog& c);
+
 }  // namespace
 
-void WriteJson(const Catalog& c, std::ostream& out) {
+void WriteJson(const Catalog& c, bool counters, std::ostream& out) {
     JsonWriter w(out);
     w.BeginObject();
     w.Key("loaders");
     w.Strings(c.loaders);
+    if (counters) WriteCalls(w, c.calls);
+    WriteRest(w, c);
+    w.EndObject();
+    w.Finish();
+}
+
+namespace {
+
+void WriteCalls(JsonWriter& w, const Calls& calls) {
     w.Key("calls");
     w.BeginObject(true);
     w.Key("addVersion");
-    w.Number(c.calls.addVersion);
+    w.Number(calls.addVersion);
     w.Key("addIncludedVersion");
-    w.Number(c.calls.addIncludedVersion);
+    w.Number(calls.addIncludedVersion);
     w.Key("addType");
-    w.Number(c.calls.addType);
+    w.Number(calls.addType);
     w.EndObject();
+}
 
+void WriteRest(JsonWriter& w, const Catalog& c) {
     w.Key("versions");
     w.BeginArray();
     for (const VersionEntry& v : c.versions) {
@@ -231,8 +245,8 @@ void WriteJson(const Catalog& c, std::ostream& out) {
     w.BeginArray();
     for (const TypeEntry& t : c.types) Type(w, t);
     w.EndArray();
-    w.EndObject();
-    w.Finish();
 }
+
+}  // namespace
 
 }  // namespace tarncatalog

@@ -1,4 +1,5 @@
-// The catalog as one JSON document: {"loaders", "calls", "versions", "types"}.
+// The catalog as one JSON document: {"loaders", "versions", "types"}, and with
+// `counters` the loaders' registry calls ("calls").
 #pragma once
 
 #include <ostream>
@@ -7,6 +8,6 @@
 
 namespace tarncatalog {
 
-void WriteJson(const Catalog& catalog, std::ostream& out);
+void WriteJson(const Catalog& catalog, bool counters, std::ostream& out);
 
 }  // namespace tarncatalog

@@ -7,6 +7,7 @@
 
 #include "args.h"
 #include "catalog.h"
+#include "html_output.h"
 #include "json_output.h"
 #include "orbit/wire/Wsdl.h"
 #include "text_output.h"
@@ -47,27 +48,30 @@ int Run(const tarncatalog::Options& options) {
         tarncatalog::WriteVersions(catalog, std::cout);
         break;
     case Command::Dump:
-        tarncatalog::WriteJson(catalog, std::cout);
+        tarncatalog::WriteJson(catalog, options.counters, std::cout);
         break;
     case Command::Wsdl:
         Orbit::Wire::WriteWsdl(*seenBy, std::cout);
         break;
+    case Command::Html: {
+        int pages = tarncatalog::WriteSite(catalog, options.outDir);
+        std::cout << "tarn-catalog: " << pages << " pages in " << options.outDir << "\n";
+        break;
+    }
     case Command::Show: {
-        for (const tarncatalog::TypeEntry& t : catalog.types) {
-            if (t.name != options.typeName) continue;
-            tarncatalog::WriteType(catalog, t, std::cout);
+        if (const tarncatalog::TypeEntry* t = tarncatalog::FindType(catalog, options.typeName)) {
+            tarncatalog::WriteType(catalog, *t, std::cout);
             return 0;
         }
         // Tell a hidden type from a missing one.
-        if (seenBy != nullptr) {
-            tarncatalog::Catalog all = tarncatalog::ReadCatalog(nullptr);
-            for (const tarncatalog::TypeEntry& t : all.types)
-                if (t.name == options.typeName)
-                    return Fail(kNotFound, "type '" + t.name + "' (" + t.version + ") is not visible to version '" +
-                                               *options.version + "'");
-        }
-        return Fail(kNotFound, "no tarn type with the wire name '" + options.typeName +
-                                   "' is registered ('tarn-catalog' lists them)");
+        tarncatalog::Catalog all = seenBy != nullptr ? tarncatalog::ReadCatalog(nullptr) : catalog;
+        if (const tarncatalog::TypeEntry* t = tarncatalog::FindType(all, options.typeName); t && seenBy != nullptr)
+            return Fail(kNotFound, "type '" + t->name + "' (" + t->version + ") is not visible to version '" +
+                                       *options.version + "'");
+        std::string message = "no type named '" + options.typeName + "' is registered";
+        std::vector<std::string> close = tarncatalog::CloseNames(all, options.typeName);
+        for (std::size_t i = 0; i < close.size(); ++i) message += (i == 0 ? "; did you mean " : " or ") + close[i];
+        return Fail(kNotFound, message + (close.empty() ? " ('tarn-catalog' lists them)" : "?"));
     }
     }
     std::cout.flush();

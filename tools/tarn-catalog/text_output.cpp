@@ -91,8 +91,13 @@ void WriteType(const Catalog& c, const TypeEntry& t, std::ostream& out) {
     out << "  kind       " << KindName(t.kind) << " (" << Hex(t.kind) << ")\n";
     out << "  flat name  " << t.flatName << "\n";
     out << "  version    " << t.version << "\n";
+    out << "  C++ class  " << t.className << (t.standin ? "  (stand-in for another library's type)" : "") << "\n";
+    out << "  header     #include \"" << t.header << "\"\n";
     out << "  namespace  " << t.ns << "\n";
-    out << "  base       " << t.base.value_or("none") << "\n";
+    out << "  base       ";
+    if (t.baseChain.empty()) out << t.base.value_or("none");
+    for (std::size_t i = 0; i < t.baseChain.size(); ++i) out << (i ? " <- " : "") << t.baseChain[i];
+    out << "\n";
     if (c.seenBy) {
         out << "  seen by    " << *c.seenBy;
         if (t.hiddenMembers > 0) out << ", which does not see " << Count(t.hiddenMembers, "member", "members");
@@ -122,6 +127,13 @@ void WriteType(const Catalog& c, const TypeEntry& t, std::ostream& out) {
     } else {
         out << "\ntags (" << t.tags.size() << "):\n";
         for (std::size_t i = 0; i < t.tags.size(); ++i) out << "  " << i << " \"" << t.tags[i] << "\"\n";
+    }
+    for (const TypeEntry* base : Ancestors(c, t)) {
+        if (base->methods.empty() && base->properties.empty()) continue;
+        out << "\ninherited from " << base->name << ":\n";
+        for (const MethodEntry& m : base->methods) out << "  method " << m.name << "  " << m.version << "\n";
+        for (const MemberEntry& p : base->properties)
+            out << "  property " << p.name << ": " << p.type.value_or("none") << "  " << Flags(p.flags) << "  " << p.version << "\n";
     }
 }
 
