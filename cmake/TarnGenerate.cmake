@@ -5,7 +5,9 @@
 # what it generates, linked to the runtime. The catalogue's headers are found
 # through the library ("#include <root>/<namespace>.h"). Stand-in types go into
 # STANDINS_TARGET when it is given, into the library otherwise; TESTING_TARGET,
-# when given, is a library of the test doubles of the catalogue's managed types.
+# when given, is a library of the test doubles of the catalogue's managed types
+# (their sources also come back as <library>_TESTING_SOURCES, the generated
+# headers as <library>_HEADERS).
 #
 # Before calling it, TARN_GEN names the generator and TARN_RUNTIME the runtime
 # target to link (the package sets both; so does the project's own build).
@@ -85,6 +87,8 @@ function(tarn_generate)
     target_link_libraries(${arg_TESTING_TARGET} PUBLIC ${arg_TARGET} ${TARN_TESTING_RUNTIME})
     add_dependencies(${arg_TESTING_TARGET} ${arg_TARGET}-generated)
   endif()
+  # For a caller that builds the doubles into a library of its own making.
+  set(${arg_TARGET}_TESTING_SOURCES ${TARN_GEN_TESTING_SOURCES} PARENT_SCOPE)
   set(${arg_TARGET}_HEADERS ${TARN_GEN_HEADERS} PARENT_SCOPE)
   set(${arg_TARGET}_GENERATED_DIR ${arg_OUT} PARENT_SCOPE)
 endfunction()
