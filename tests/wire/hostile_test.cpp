@@ -146,6 +146,36 @@ TEST(WireHostile, EachRefusalIsItsFaultNamingThePathAndLeavesNothing) {
     EXPECT_EQ(&RequireVersion("\"urn:tarnd3/2.0\""), VersionNamed("tarn.version.version6"));
 }
 
+// A request as another SOAP client writes it: its own prefixes, layout, a header,
+// xsi:type where it is not needed, CDATA and character references.
+TEST(WireHostile, ARequestInAnotherClientsStyleIsRead) {
+    const std::string body = R"(<?xml version='1.0' encoding='utf-8'?>
+<soap-env:Envelope xmlns:soap-env="http://schemas.xmlsoap.org/soap/envelope/">
+  <soap-env:Header><trace xmlns="urn:elsewhere"><hop>1</hop></trace></soap-env:Header>
+  <soap-env:Body>
+    <ns0:DebugAcquireLock xmlns:ns0="urn:tarnd3">
+      <ns0:target moType="tarn.LockStresser">stresser-1</ns0:target>
+      <ns0:objects xmlns:xsi="http://www.w3.org/2001/XMLSchema-instance" moType="tarn.vmprov.Action"
+                   xsi:type="ns0:ManagedObjectReference">vm-7</ns0:objects>
+      <mode xmlns="urn:tarnd3"><![CDATA[x&]]>&#x61;ll</mode>
+      <ns0:holdDurationMillis> +250 </ns0:holdDurationMillis>
+      <ns0:iters>3</ns0:iters>
+      <ns0:durationBetweenItersMillis>40</ns0:durationBetweenItersMillis>
+    </ns0:DebugAcquireLock>
+  </soap-env:Body>
+</soap-env:Envelope>)";
+    Request request = Codec(*VersionNamed("tarn.version.version8")).DecodeRequest(body);
+    EXPECT_EQ(request.method, AcquireLock());
+    EXPECT_EQ(request.target->GetId(), "stresser-1");
+    auto* objects = Kernite::NarrowToType<Orbit::DataArray<Orbit::MoRef>, Orbit::Any>(request.args[0].Get());
+    ASSERT_EQ(objects->GetLength(), 1);
+    EXPECT_EQ(objects->GetAt(0)->GetType(), "tarn.vmprov.Action");
+    using Text = Orbit::Primitive<std::string>;
+    using Long = Orbit::Primitive<long long>;
+    EXPECT_EQ((Kernite::NarrowToType<Text, Orbit::Any>(request.args[1].Get())->GetValue()), "x&all");
+    EXPECT_EQ((Kernite::NarrowToType<Long, Orbit::Any>(request.args[2].Get())->GetValue()), 250);
+}
+
 // Each limit accepts what is exactly at it and refuses one more.
 TEST(WireHostile, LimitsHoldAtTheirBoundaries) {
     const std::string good = GoodRequest();

@@ -70,6 +70,12 @@ def main():
         if piece not in text:
             failures.append(f"the DebugAcquireLock request lacks {piece}: {text}")
 
+    # References are typed as such, whatever managed type they name.
+    request = {name: element.type.name for name, element in
+               v8.get_element(f"{{{NS}}}DebugAcquireLock").type.elements}
+    if request.get("objects") != "ManagedObjectReference":
+        failures.append(f"DebugAcquireLock's objects are typed {request.get('objects')}")
+
     # Each version's schema holds exactly the members it sees.
     checked = 0
     for t in dump["types"]:

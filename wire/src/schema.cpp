@@ -156,6 +156,8 @@ Slot Schema::MakeSlot(const Member& member) {
     slot.type = slot.declared = member.GetType();
     slot.shape = ShapeOf(slot.type);
     if (slot.shape == Shape::Enum) slot.enumType = dynamic_cast<const EnumType*>(slot.type);
+    // A reference to any managed type travels as one type.
+    if (slot.shape == Shape::MoRef) slot.type = GetType<MoRef>();
     if (slot.shape == Shape::Data) {
         DataTable* declared = Ensure(Kernite::NarrowToType<DataObjectType, Type>(slot.type));
         slot.type = declared->written;
