@@ -36,9 +36,9 @@ public:
         _diagnostics.Check();
         for (auto& [type, syntax] : _declared) ResolveType(*type, *syntax);
         _diagnostics.Check();
-        for (auto& [type, syntax] : _declared) Try([&] { CheckBaseChain(*type, *syntax); });
-        for (auto& [type, syntax] : _declared)
-            if (type->kind == Kind::Managed) Try([&] { CheckMemberNames(*type); });
+        for (const auto& declared : _declared) Try([&] { CheckBaseChain(*declared.first, *declared.second); });
+        for (const auto& declared : _declared)
+            if (declared.first->kind == Kind::Managed) Try([&] { CheckMemberNames(*declared.first); });
         _diagnostics.Check();
         return std::move(_model);
     }
