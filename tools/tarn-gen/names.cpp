@@ -40,11 +40,24 @@ std::string ClassPath(const std::string& wireName) {
     return out;
 }
 
-std::string Record(const std::string& wireName) { return "g" + Flat(wireName) + "TypeInfo"; }
+namespace {
 
-std::string RuntimeRecord(const std::string& symbol) { return "Orbit::g" + symbol + "TypeInfo"; }
+// prefix + middle + suffix, appended in order: GCC 12 at -O3 warns (-Wrestrict, a
+// false alarm) on a literal put in front of a temporary string with operator+.
+std::string Around(const char* prefix, const std::string& middle, const char* suffix) {
+    std::string out = prefix;
+    out += middle;
+    out += suffix;
+    return out;
+}
 
-std::string MethodObjects(const std::string& wireName) { return "g" + Flat(wireName) + "MethodObjects"; }
+}  // namespace
+
+std::string Record(const std::string& wireName) { return Around("g", Flat(wireName), "TypeInfo"); }
+
+std::string RuntimeRecord(const std::string& symbol) { return Around("Orbit::g", symbol, "TypeInfo"); }
+
+std::string MethodObjects(const std::string& wireName) { return Around("g", Flat(wireName), "MethodObjects"); }
 
 std::string Loader(const std::string& unitName) { return Flat(unitName) + "TypeinfoTypeInfoLoader"; }
 
