@@ -1,5 +1,6 @@
 #include "decoder.h"
 
+#include <array>
 #include <charconv>
 #include <climits>
 #include <cmath>
@@ -45,6 +46,14 @@ bool IsAllowedReference(std::string_view rest) {
     return error == std::errc() && ptr == rest.data() + end && IsXmlChar(code);
 }
 
+// Bytes that mean nothing to the first pass in any mode.
+constexpr auto kPlain = [] {
+    std::array<bool, 256> plain{};
+    for (int c = 0x20; c < 0x80; ++c) plain[c] = c != '<' && c != '&' && c != '-' && c != ']';
+    plain['\t'] = plain['\n'] = plain['\r'] = true;
+    return plain;
+}();
+
 // The first pass: size, characters, and nothing that would make the parser read a
 // DTD or an entity. Also bounds the parser's work: every element takes a '<'.
 void Prescan(std::string_view text, const Limits& limits) {
@@ -62,6 +71,9 @@ void Prescan(std::string_view text, const Limits& limits) {
         ThrowFault<MalformedMessage>("", what + " at byte " + std::to_string(p - begin));
     };
     for (const unsigned char* p = begin; p < end;) {
+        // Most bytes need no thought: skip them in a tight loop.
+        while (p < end && kPlain[*p]) ++p;
+        if (p == end) break;
         const unsigned char c = *p;
         if (c >= 0x80) {
             const std::size_t n = Utf8Sequence(p, end);
