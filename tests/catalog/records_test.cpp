@@ -152,8 +152,9 @@ TEST(Records, EveryFieldOfEveryTypeIsWhatTheCatalogueSays) {
                 EXPECT_EQ(tags, t.tags);
                 continue;
             }
-            const char* root = t.kind == Kind::Data ? "strata.DynamicData"
-                               : t.kind == Kind::Fault ? "strata.MethodFault" : "strata.ManagedObject";
+            std::string root;  // the runtime's root of the kind
+            for (const Orbit::RuntimeRecord& row : Orbit::kRuntimeRecords)
+                if (row.root && row.kind == static_cast<std::uint32_t>(t.kind)) root = row.wireName;
             ASSERT_NE(type->GetBaseType(), nullptr);
             EXPECT_EQ(type->GetBaseType()->GetName(), t.base ? Referenced(t.ns, *t.base) : root);
             if (t.kind == Kind::Managed) {
