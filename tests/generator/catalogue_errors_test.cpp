@@ -29,6 +29,9 @@ struct Case {
     std::string other;     // idl/tarn.u.idl, when not empty
 };
 
+// Test names and failures show the row, not its bytes.
+void PrintTo(const Case& c, std::ostream* os) { *os << c.what; }
+
 std::string T(const std::string& lines) { return "namespace tarn.t\n" + lines; }
 
 CatalogueError Failure(const Case& c) {
