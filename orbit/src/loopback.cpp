@@ -9,21 +9,6 @@
 namespace Orbit {
 namespace {
 
-thread_local RequestContext* tCurrentContext = nullptr;
-
-// Sets the served call's context for the current thread, restoring the outer one
-// (a call served inside another) afterwards.
-class ContextScope {
-public:
-    explicit ContextScope(RequestContext* context) : _outer(tCurrentContext) { tCurrentContext = context; }
-    ~ContextScope() { tCurrentContext = _outer; }
-    ContextScope(const ContextScope&) = delete;
-    ContextScope& operator=(const ContextScope&) = delete;
-
-private:
-    RequestContext* _outer;
-};
-
 [[noreturn]] void Fail(const std::string& message) {
     Kernite::Ref<MethodFault> fault(new MethodFault());
     fault->SetMsg(message);
@@ -35,69 +20,18 @@ std::string Describe(const ManagedMethod* method) {
     return (owner ? owner->GetName() + "." : std::string()) + method->GetName();
 }
 
-// The exception a failed asynchronous call reports, of its own class where it is one of ours.
-std::unique_ptr<Kernite::Exception> CaptureFailure() {
-    try {
-        throw;
-    } catch (const Kernite::Exception& e) {
-        return std::unique_ptr<Kernite::Exception>(e.Clone());
-    } catch (const std::exception& e) {
-        return std::make_unique<Kernite::Exception>(e.what());
-    } catch (...) {
-        return std::make_unique<Kernite::Exception>("unknown exception");
-    }
-}
-
 }  // namespace
 
 LoopbackAdapter::LoopbackAdapter() = default;
 
 LoopbackAdapter::~LoopbackAdapter() {
     Shutdown();
-    std::unordered_map<std::string, Kernite::Ref<ManagedObject>> objects;
-    {
-        std::lock_guard<std::mutex> lock(_objectsMutex);
-        objects.swap(_objects);
-    }
-    for (auto& entry : objects) entry.second->_Unregistered();
-}
-
-void LoopbackAdapter::Register(const std::string& id, ManagedObject* object) {
-    if (object == nullptr) {
-        Unregister(id);
-        return;
-    }
-    Kernite::Ref<ManagedObject> previous;
-    {
-        std::lock_guard<std::mutex> lock(_objectsMutex);
-        Kernite::Ref<ManagedObject>& slot = _objects[id];
-        previous = std::move(slot);
-        slot = object;
-    }
-    if (previous && previous.Get() != object) previous->_Unregistered();
-}
-
-void LoopbackAdapter::Unregister(const std::string& id) {
-    Kernite::Ref<ManagedObject> previous;
-    {
-        std::lock_guard<std::mutex> lock(_objectsMutex);
-        auto it = _objects.find(id);
-        if (it == _objects.end()) return;
-        previous = std::move(it->second);
-        _objects.erase(it);
-    }
-    previous->_Unregistered();
+    UnregisterAll();
 }
 
 Kernite::Ref<ManagedObject> LoopbackAdapter::CreateStub(const std::string& id, ManagedObjectType* type,
                                                         RequestContext* context) {
     return type ? type->CreateStub(id, this, context) : Kernite::Ref<ManagedObject>();
-}
-
-Kernite::Ref<ManagedObject> LoopbackAdapter::Find(const std::string& id) const {
-    std::lock_guard<std::mutex> lock(_objectsMutex);
-    auto it = _objects.find(id);
-    return it == _objects.end() ? Kernite::Ref<ManagedObject>() : it->second;
 }
 
 void LoopbackAdapter::Invoke(const std::string& id, ManagedMethod* method, Kernite::RefVector<Any>& args,
@@ -107,21 +41,12 @@ void LoopbackAdapter::Invoke(const std::string& id, ManagedMethod* method, Kerni
     Kernite::Ref<ManagedObject> target = Find(id);
     if (!target) Fail("unknown managed object id '" + id + "' in call of " + Describe(method));
 
-    // The member must be one of its declaring type's, and the target must be of that type.
-    ManagedObjectType* declaring = method->GetDeclaringType();
-    Type* targetType = target->_GetType();
-    const int number = method->GetMemberNumber();
-    const ManagedTypeInfo* info = declaring ? declaring->GetManagedTypeInfo() : nullptr;
-    const bool known = declaring != nullptr && number >= 0 &&
-                       number < static_cast<int>(declaring->GetMembers().size()) &&
-                       declaring->GetMembers()[number].Get() == method;
-    if (!known || info->invokeMember == nullptr || targetType == nullptr || !targetType->IsA(declaring)) {
+    if (!Answers(target.Get(), method)) {
+        Type* targetType = target->_GetType();
         Fail("managed object '" + id + "' of type '" + (targetType ? targetType->GetName() : std::string("?")) +
              "' has no member " + Describe(method));
     }
-
-    ContextScope scope(context);
-    info->invokeMember(target.Get(), number, args, result);
+    Dispatch(target.Get(), method, args, result, context);
 }
 
 void LoopbackAdapter::StartInvoke(const std::string& id, ManagedMethod* method, Kernite::RefVector<Any>& args,
@@ -129,22 +54,11 @@ void LoopbackAdapter::StartInvoke(const std::string& id, ManagedMethod* method, 
                                   Kernite::Ref<Kernite::System::ScheduledItem>& item, RequestContext* context) {
     Kernite::Ref<Kernite::System::ScheduledItem> started(new Kernite::System::ScheduledItem());
     auto call = [this, id, method, args, callback, started, context = Kernite::Ref<RequestContext>(context)]() mutable {
-        Kernite::Ref<Any> result;
-        std::unique_ptr<Kernite::Exception> failure;
-        try {
+        CompleteCall(started.Get(), callback, [&] {
+            Kernite::Ref<Any> result;
             Invoke(id, method, args, result, context.Get());
-        } catch (...) {
-            failure = CaptureFailure();
-            result = nullptr;
-        }
-        if (callback) {
-            // A callback's own failure has nowhere to go; the call's outcome stands.
-            try {
-                callback(started.Get(), failure.get(), result.Get());
-            } catch (...) {
-            }
-        }
-        started->Complete(failure.get());
+            return result;
+        });
     };
     {
         std::lock_guard<std::mutex> lock(_queue->mutex);
@@ -177,7 +91,7 @@ void LoopbackAdapter::Shutdown() {
     worker.detach();
 }
 
-RequestContext* LoopbackAdapter::CurrentContext() { return tCurrentContext; }
+RequestContext* LoopbackAdapter::CurrentContext() { return CurrentRequestContext(); }
 
 std::function<void()> LoopbackAdapter::WorkQueue::Next(bool wait) {
     std::unique_lock<std::mutex> lock(mutex);

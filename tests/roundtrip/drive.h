@@ -24,14 +24,32 @@ struct Outcome {
 Outcome CallSync(Orbit::ManagedMethod* member, Orbit::ManagedObject* stub, Kernite::RefVector<Orbit::Any> args);
 Outcome CallAsync(Orbit::ManagedMethod* member, Orbit::ManagedObject* stub, Kernite::RefVector<Orbit::Any> args);
 
-// A double of the most derived type, hosted on `adapter` under the type's wire
-// name, and a stub of the same type that reaches it.
+// A double of the most derived type, hosted on `host` under the type's wire name,
+// and a stub of the same type that reaches it through `stubAdapter`.
 struct Hosted {
     Kernite::Ref<Orbit::ManagedObject> object;
     Tarn::Testing::Double* dbl = nullptr;
     Kernite::Ref<Orbit::ManagedObject> stub;
 };
-Hosted Host(Orbit::ManagedObjectType* type, Orbit::LoopbackAdapter* adapter, Orbit::StubAdapter* stubAdapter = nullptr);
+Hosted Host(Orbit::ManagedObjectType* type, Orbit::ObjectHost* host, Orbit::StubAdapter* stubAdapter);
+
+// Every member of every managed type, own and inherited, from a client stub through
+// `adapter` to a test double hosted on `host` and back: arguments and results (all
+// set, then optional ones null), sync and async, and a fault of each member. Each
+// value must arrive equal to what was sent, and a fault as its own class.
+struct Trip {
+    Orbit::ObjectHost* host = nullptr;
+    Orbit::StubAdapter* adapter = nullptr;
+    // The version the adapter speaks: values hold only what it sees, and the members
+    // it does not see must be refused with strata.wire.UnknownMethod. Null: all.
+    const Orbit::Version* version = nullptr;
+    // A wire lies between: what arrives is a copy, never the object sent.
+    bool copies = false;
+};
+struct TripCounts {
+    std::size_t types = 0, members = 0, exercised = 0, refused = 0, syncCalls = 0, asyncCalls = 0;
+};
+TripCounts RunEveryMember(const Trip& trip);
 
 // Forwards to a loopback adapter and, when told to, hands the stub another answer
 // than the server gave: what no generated server would produce.

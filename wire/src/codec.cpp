@@ -75,6 +75,23 @@ std::string Codec::EncodeRequest(const MoRef& target, const ManagedMethod& metho
 
 Request Codec::DecodeRequest(std::string_view body) const { return Decoder(*_schema, _limits).DecodeRequest(body); }
 
+PendingRequest Codec::BeginRequest(std::string_view body) const {
+    return PendingRequest(std::make_unique<Decoder>(*_schema, _limits), body);
+}
+
+PendingRequest::PendingRequest(std::unique_ptr<Decoder> decoder, std::string_view body)
+    : _decoder(std::move(decoder)) {
+    _target = _decoder->BeginRequest(body, _method);
+}
+
+PendingRequest::PendingRequest(PendingRequest&&) noexcept = default;
+PendingRequest& PendingRequest::operator=(PendingRequest&&) noexcept = default;
+PendingRequest::~PendingRequest() = default;
+
+Kernite::RefVector<Any> PendingRequest::DecodeArguments() { return _decoder->DecodeArguments(); }
+
+const std::string& PendingRequest::GetOperation() const noexcept { return _decoder->Operation(); }
+
 std::string Codec::EncodeResponse(const ManagedMethod& method, Any* result) const {
     const MethodTable& table = Require(*_schema, method);
     if (!table.hasResult && result != nullptr)
@@ -99,7 +116,7 @@ std::string Codec::EncodeFault(MethodFault& fault) const {
     out.reserve(512);
     Encoder encoder(*_schema, out);
     encoder.OpenEnvelope({});
-    encoder.Fault(fault, dynamic_cast<InvalidRequest*>(&fault) != nullptr);
+    encoder.Fault(fault, IsClientFault(fault));
     encoder.CloseEnvelope({});
     return out;
 }

@@ -270,10 +270,17 @@ Decoder::Ns Decoder::Resolve(std::string_view qname, std::string_view& local, bo
 // ---- calls, results, faults, values ----
 
 Request Decoder::DecodeRequest(std::string_view body) {
+    Request request;
+    request.target = BeginRequest(body, request.method);
+    request.args = DecodeArguments();
+    return request;
+}
+
+Kernite::Ref<MoRef> Decoder::BeginRequest(std::string_view body, ManagedMethod*& method) {
     pugi::xml_node operation = Body(body);
-    Entered op = EnterOurs(operation);
-    const MethodTable* method = _schema.MethodByElement(op.local);
-    if (method == nullptr)
+    _operation = EnterOurs(operation);
+    _method = _schema.MethodByElement(_operation.local);
+    if (_method == nullptr)
         Fail<UnknownMethod>("no operation of that name in " + _schema.GetVersion().GetName());
     pugi::xml_node first = NextElement(operation.first_child());
     if (!first) FailAt<MissingElement>("target", "the target is missing");
@@ -283,16 +290,23 @@ Request Decoder::DecodeRequest(std::string_view body) {
     if (type == nullptr)
         Fail<UnknownMethod>("no managed type '" + std::string(target.moType) + "' in " +
                             _schema.GetVersion().GetName());
-    if (!type->IsA(method->owner))
-        Fail<UnknownMethod>(type->GetName() + " has no operation " + method->element);
-    Request request;
-    request.target = new MoRef(target.moType, std::string(TextOf(first)));
+    if (!type->IsA(_method->owner))
+        Fail<UnknownMethod>(type->GetName() + " has no operation " + _method->element);
+    Kernite::Ref<MoRef> ref(new MoRef(target.moType, std::string(TextOf(first))));
     LeaveOurs(target);
-    request.method = method->method;
-    request.args = Kernite::RefVector<Any>(static_cast<unsigned>(method->params.size()));
-    ReadMembers(first.next_sibling(), method->params, nullptr, &request.args);
-    LeaveOurs(op);
-    return request;
+    _arguments = first.next_sibling();
+    _operationName = &_method->element;
+    method = _method->method;
+    return ref;
+}
+
+Kernite::RefVector<Any> Decoder::DecodeArguments() {
+    if (_method == nullptr) throw Kernite::Exception("the arguments of a request were decoded twice");
+    Kernite::RefVector<Any> args(static_cast<unsigned>(_method->params.size()));
+    ReadMembers(_arguments, _method->params, nullptr, &args);
+    LeaveOurs(_operation);
+    _method = nullptr;
+    return args;
 }
 
 Kernite::Ref<Any> Decoder::DecodeResponse(std::string_view body, const MethodTable& method) {

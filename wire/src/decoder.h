@@ -21,6 +21,11 @@ public:
     Decoder(const Schema& schema, const Limits& limits) : _schema(schema), _limits(limits) {}
 
     Request DecodeRequest(std::string_view body);
+    // A request in two steps: the target and the method, then the arguments (once).
+    Kernite::Ref<MoRef> BeginRequest(std::string_view body, ManagedMethod*& method);
+    Kernite::RefVector<Any> DecodeArguments();
+    // The body's element of the request begun.
+    const std::string& Operation() const noexcept { return *_operationName; }
     // A fault in the body is thrown as its own class.
     Kernite::Ref<Any> DecodeResponse(std::string_view body, const MethodTable& method);
     Kernite::Ref<MethodFault> DecodeFault(std::string_view body);
@@ -91,7 +96,7 @@ private:
     static constexpr std::size_t npos = static_cast<std::size_t>(-1);
 
     const Schema& _schema;
-    const Limits& _limits;
+    const Limits _limits;
     pugi::xml_document _document;
     std::vector<Binding> _bindings;
     int _depth = 0;
@@ -104,6 +109,12 @@ private:
     std::string _scratch;
     std::string _text;
     std::string _key;
+    // Between the two steps of a request: the operation entered, where its
+    // arguments start, and its table (null once they are decoded).
+    Entered _operation{};
+    pugi::xml_node _arguments;
+    const MethodTable* _method = nullptr;
+    const std::string* _operationName = nullptr;
 };
 
 }  // namespace Orbit::Wire

@@ -1,5 +1,7 @@
 #include "orbit/wire/Faults.h"
 
+#include <type_traits>
+
 #include "orbit/Dispatch.h"
 #include "orbit/Registry.h"
 #include "schema.h"
@@ -44,14 +46,16 @@ const DataTypeInfo kInvalidRequestRecord{&kInvalidRequestHeader, &gStrataMethodF
                                          kInvalidRequestProperties, GetPath, SetPath, IsPathSet, NoUnset,
                                          NewInvalidRequest, NewInvalidRequestArray};
 
-// The records of one kind: its header names it, its base is InvalidRequest.
+// The records of one kind: its header names it; its base is InvalidRequest for the
+// refused messages and MethodFault for the others.
 template <class F>
 struct KindRecord {
     static const TypeInfo header;
     static DataObject* Create() { return new F(); }
     static Any* CreateArray() { return new DataArray<F>(); }
-    static constexpr DataTypeInfo record{&header, &kInvalidRequestHeader, kNoProperties, NoGet, NoSet,
-                                         AlwaysSet, NoUnset, Create, CreateArray};
+    static constexpr DataTypeInfo record{
+        &header, std::is_base_of_v<InvalidRequest, F> ? &kInvalidRequestHeader : &gStrataMethodFaultTypeInfo,
+        kNoProperties, NoGet, NoSet, AlwaysSet, NoUnset, Create, CreateArray};
 };
 
 #define ORBIT_WIRE_KIND(Name)                                                                       \
@@ -65,6 +69,10 @@ ORBIT_WIRE_KIND(InvalidValue)
 ORBIT_WIRE_KIND(LimitExceeded)
 ORBIT_WIRE_KIND(UnknownMethod)
 ORBIT_WIRE_KIND(UnknownVersion)
+ORBIT_WIRE_KIND(UnknownObject)
+ORBIT_WIRE_KIND(NotAuthenticated)
+ORBIT_WIRE_KIND(NotAuthorized)
+ORBIT_WIRE_KIND(ServerFault)
 #undef ORBIT_WIRE_KIND
 
 }  // namespace
@@ -74,11 +82,18 @@ void RegisterFaultTypes() {
         TypeMap* map = GetTypeMap();
         for (Type* type : {GetType<InvalidRequest>(), GetType<MalformedMessage>(), GetType<UnknownElement>(),
                            GetType<MissingElement>(), GetType<InvalidValue>(), GetType<LimitExceeded>(),
-                           GetType<UnknownMethod>(), GetType<UnknownVersion>()})
+                           GetType<UnknownMethod>(), GetType<UnknownVersion>(), GetType<UnknownObject>(),
+                           GetType<NotAuthenticated>(), GetType<NotAuthorized>(), GetType<ServerFault>()})
             map->AddType(type);
         return true;
     }();
     (void)registered;
+}
+
+bool IsClientFault(const MethodFault& fault) {
+    return dynamic_cast<const InvalidRequest*>(&fault) != nullptr ||
+           dynamic_cast<const NotAuthenticated*>(&fault) != nullptr ||
+           dynamic_cast<const NotAuthorized*>(&fault) != nullptr;
 }
 
 InvalidRequest::Exception* InvalidRequest::Exception::Clone() const { return new Exception(*this); }
@@ -115,6 +130,10 @@ ORBIT_WIRE_GET_TYPE(InvalidValue)
 ORBIT_WIRE_GET_TYPE(LimitExceeded)
 ORBIT_WIRE_GET_TYPE(UnknownMethod)
 ORBIT_WIRE_GET_TYPE(UnknownVersion)
+ORBIT_WIRE_GET_TYPE(UnknownObject)
+ORBIT_WIRE_GET_TYPE(NotAuthenticated)
+ORBIT_WIRE_GET_TYPE(NotAuthorized)
+ORBIT_WIRE_GET_TYPE(ServerFault)
 #undef ORBIT_WIRE_GET_TYPE
 
 }  // namespace Orbit

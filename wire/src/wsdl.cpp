@@ -15,7 +15,7 @@ class WsdlWriter {
 public:
     WsdlWriter(const Schema& schema, std::ostream& out) : _schema(schema), _out(out) {}
 
-    void Write() {
+    void Write(std::string_view address) {
         const std::string& ns = _schema.Namespace();
         const std::string name = ns.substr(ns.find(':') + 1);
         _out << R"(<?xml version="1.0" encoding="UTF-8"?>)" << '\n'
@@ -29,7 +29,10 @@ public:
         Messages();
         Operations(name);
         _out << "<service name=\"" << name << "Service\"><port name=\"" << name << "Port\" binding=\"t:" << name
-             << "Binding\"><soap:address location=\"http://localhost/" << name << "\"/></port></service>\n"
+             << "Binding\"><soap:address location=\"";
+        if (address.empty()) _out << "http://localhost/" << name;
+        else _out << address;
+        _out << "\"/></port></service>\n"
              << "</definitions>\n";
     }
 
@@ -110,7 +113,9 @@ private:
 
     // The faults an operation declares, as the version names them, and the wire's.
     std::set<std::string> FaultsOf(const MethodTable& method) const {
-        std::set<std::string> names{GetType<InvalidRequest>()->GetName()};
+        std::set<std::string> names{GetType<InvalidRequest>()->GetName(), GetType<NotAuthenticated>()->GetName(),
+                                    GetType<ServerFault>()->GetName()};
+        if (method.method->GetPrivilege() != nullptr) names.insert(GetType<NotAuthorized>()->GetName());
         for (const TypeInfo* fault : method.method->GetFaults())
             if (const DataTable* table = _schema.Data(FindType(fault))) names.insert(table->written->GetName());
         return names;
@@ -156,6 +161,8 @@ private:
 
 }  // namespace
 
-void WriteWsdl(const Version& version, std::ostream& out) { WsdlWriter(Schema::For(version), out).Write(); }
+void WriteWsdl(const Version& version, std::ostream& out, std::string_view address) {
+    WsdlWriter(Schema::For(version), out).Write(address);
+}
 
 }  // namespace Orbit::Wire

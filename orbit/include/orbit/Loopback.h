@@ -9,21 +9,17 @@
 #include <mutex>
 #include <string>
 #include <thread>
-#include <unordered_map>
 
-#include "orbit/Managed.h"
+#include "orbit/Host.h"
 
 namespace Orbit {
 
-class LoopbackAdapter : public StubAdapter {
+// Hosts objects (ObjectHost's Register, Unregister) and serves its stubs' calls.
+class LoopbackAdapter : public StubAdapter, public ObjectHost {
 public:
     LoopbackAdapter();
     ~LoopbackAdapter() override;
 
-    // Hosts `object` under `id`, replacing (and unregistering) any earlier one.
-    void Register(const std::string& id, ManagedObject* object);
-    // Stops hosting `id` and tells the object; unknown ids are ignored.
-    void Unregister(const std::string& id);
     // A stub of `type` for `id`, through this adapter.
     Kernite::Ref<ManagedObject> CreateStub(const std::string& id, ManagedObjectType* type,
                                            RequestContext* context = nullptr);
@@ -44,7 +40,8 @@ public:
     // reference there), it runs what is still queued itself and lets the worker end.
     void Shutdown();
 
-    // The context of the call being served on this thread, or null.
+    // The context of the call being served on this thread, or null; the same as
+    // Orbit::CurrentRequestContext().
     static RequestContext* CurrentContext();
 
 private:
@@ -59,11 +56,7 @@ private:
         std::function<void()> Next(bool wait);
     };
 
-    Kernite::Ref<ManagedObject> Find(const std::string& id) const;
     static void WorkerLoop(std::shared_ptr<WorkQueue> queue);
-
-    mutable std::mutex _objectsMutex;
-    std::unordered_map<std::string, Kernite::Ref<ManagedObject>> _objects;
 
     const std::shared_ptr<WorkQueue> _queue = std::make_shared<WorkQueue>();
     std::thread _worker;  // guarded by _queue->mutex

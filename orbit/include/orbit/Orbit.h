@@ -7,6 +7,7 @@
 #include "orbit/DataObject.h"
 #include "orbit/Dispatch.h"
 #include "orbit/Enum.h"
+#include "orbit/Host.h"
 #include "orbit/Loopback.h"
 #include "orbit/Managed.h"
 #include "orbit/Primitive.h"

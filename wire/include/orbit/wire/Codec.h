@@ -40,6 +40,7 @@
 #pragma once
 
 #include <cstddef>
+#include <memory>
 #include <string>
 #include <string_view>
 
@@ -50,6 +51,7 @@
 namespace Orbit::Wire {
 
 class Schema;
+class Decoder;
 
 // What a decoder accepts at most. The defaults suit requests of a few megabytes.
 struct Limits {
@@ -77,6 +79,33 @@ struct Request {
     Kernite::RefVector<Any> args;
 };
 
+// A request read in two steps, so that a server can refuse a call (an unknown target,
+// a privilege the caller lacks) before any argument is built: Codec::BeginRequest
+// reads the envelope up to the target and names the method, DecodeArguments() then
+// reads the arguments. Holds its own copy of the message; one thread at a time.
+class PendingRequest {
+public:
+    PendingRequest(PendingRequest&&) noexcept;
+    PendingRequest& operator=(PendingRequest&&) noexcept;
+    ~PendingRequest();
+
+    MoRef* GetTarget() const noexcept { return _target.Get(); }
+    ManagedMethod* GetMethod() const noexcept { return _method; }
+    // The body's element ("DebugAcquireLock"), the first step of fault paths.
+    const std::string& GetOperation() const noexcept;
+    // The arguments, boxed as DecodeRequest boxes them. A second call throws
+    // Kernite::Exception.
+    Kernite::RefVector<Any> DecodeArguments();
+
+private:
+    friend class Codec;
+    PendingRequest(std::unique_ptr<Decoder> decoder, std::string_view body);
+
+    std::unique_ptr<Decoder> _decoder;
+    Kernite::Ref<MoRef> _target;
+    ManagedMethod* _method = nullptr;
+};
+
 class Codec {
 public:
     explicit Codec(const Version& version, Limits limits = {});
@@ -90,6 +119,9 @@ public:
                               const Kernite::RefVector<Any>& args) const;
     // Server: the call in `body`.
     Request DecodeRequest(std::string_view body) const;
+    // Server: the same in two steps; the target and the method are read (and refused
+    // with the same faults) here, the arguments by PendingRequest::DecodeArguments.
+    PendingRequest BeginRequest(std::string_view body) const;
 
     // Server: the answer to a call of `method`; `result` as invokeMember left it.
     std::string EncodeResponse(const ManagedMethod& method, Any* result) const;

@@ -1,9 +1,11 @@
-// The faults of the wire: what a peer hears when its message cannot be read. Each is
-// a runtime fault type with its own record (wire name "strata.wire.<Name>", version
-// "strata.version.version0", so every API version sees it), registered with the type
-// map when the first Codec is made, so that the other end decodes it as its own class.
+// The faults of the wire: what a peer hears when its message cannot be read, or when
+// a server refuses or fails a call. Each is a runtime fault type with its own record
+// (wire name "strata.wire.<Name>", version "strata.version.version0", so every API
+// version sees it), registered with the type map when the first Codec is made, so
+// that the other end decodes it as its own class.
 //
-//   strata.wire.InvalidRequest      the base; `path` names the offending element
+//   strata.wire.InvalidRequest      the base of the refused messages; `path` names
+//                                   the offending element
 //     strata.wire.MalformedMessage  not well-formed XML, a DOCTYPE, an entity
 //                                   reference, bad UTF-8, not a SOAP 1.1 envelope
 //     strata.wire.UnknownElement    an element or attribute that is not expected
@@ -17,6 +19,12 @@
 //     strata.wire.UnknownMethod     a method the API version does not see, or
 //                                   that the target's type does not have
 //     strata.wire.UnknownVersion    an API version that is not registered
+//     strata.wire.UnknownObject     a target id that the server hosts no object under
+//   strata.wire.NotAuthenticated    credentials that the server refuses (directly a
+//                                   MethodFault, as are the three below)
+//   strata.wire.NotAuthorized       a member whose privilege the caller does not hold
+//   strata.wire.ServerFault         an implementation failed with an exception that is
+//                                   not a fault; the message is the exception's
 //
 // The message reads "<path>: <what is wrong>"; paths start at the body's element,
 // "/DebugAcquireLock/holdDurationMillis", and count repeated elements from 0,
@@ -56,26 +64,29 @@ private:
     std::string _path;
 };
 
-// One kind of invalid request: its own class, record and exception, nothing else.
-template <class Tag>
-class RequestFaultKind : public InvalidRequest {
+// One kind of fault: its own class, record and exception, nothing else.
+template <class Tag, class Base>
+class FaultKind : public Base {
 public:
-    class Exception : public InvalidRequest::Exception {
+    class Exception : public Base::Exception {
     public:
-        using InvalidRequest::Exception::Exception;
+        using Base::Exception::Exception;
         Exception* Clone() const override { return new Exception(*this); }
         [[noreturn]] void Throw() const override { throw *this; }
     };
 
-    Type* _GetType() const override { return GetType<RequestFaultKind>(); }
-    DataObjectType* _GetDataType() const override { return GetDoType<RequestFaultKind>(); }
+    Type* _GetType() const override { return GetType<FaultKind>(); }
+    DataObjectType* _GetDataType() const override { return GetDoType<FaultKind>(); }
     unsigned int _GetSize(SizeFunction f) const override {
-        return InvalidRequest::_GetSize(f) - f(sizeof(InvalidRequest)) + f(sizeof(RequestFaultKind));
+        return Base::_GetSize(f) - f(sizeof(Base)) + f(sizeof(FaultKind));
     }
-    Any* _Clone() const override { return new RequestFaultKind(*this); }
+    Any* _Clone() const override { return new FaultKind(*this); }
     [[noreturn]] void Throw() override { throw Exception(_GetType()->GetName(), this); }
     Exception* CreateException() override { return new Exception(_GetType()->GetName(), this); }
 };
+
+template <class Tag>
+using RequestFaultKind = FaultKind<Tag, InvalidRequest>;
 
 struct MalformedMessageTag;
 struct UnknownElementTag;
@@ -84,6 +95,10 @@ struct InvalidValueTag;
 struct LimitExceededTag;
 struct UnknownMethodTag;
 struct UnknownVersionTag;
+struct UnknownObjectTag;
+struct NotAuthenticatedTag;
+struct NotAuthorizedTag;
+struct ServerFaultTag;
 using MalformedMessage = RequestFaultKind<MalformedMessageTag>;
 using UnknownElement = RequestFaultKind<UnknownElementTag>;
 using MissingElement = RequestFaultKind<MissingElementTag>;
@@ -91,6 +106,10 @@ using InvalidValue = RequestFaultKind<InvalidValueTag>;
 using LimitExceeded = RequestFaultKind<LimitExceededTag>;
 using UnknownMethod = RequestFaultKind<UnknownMethodTag>;
 using UnknownVersion = RequestFaultKind<UnknownVersionTag>;
+using UnknownObject = RequestFaultKind<UnknownObjectTag>;
+using NotAuthenticated = FaultKind<NotAuthenticatedTag, MethodFault>;
+using NotAuthorized = FaultKind<NotAuthorizedTag, MethodFault>;
+using ServerFault = FaultKind<ServerFaultTag, MethodFault>;
 
 // Throws a new fault of class F with `path` and the message "<path>: <what>".
 template <class F>
@@ -100,6 +119,18 @@ template <class F>
     fault->SetMsg(path.empty() ? what : path + ": " + what);
     throw typename F::Exception(fault->_GetType()->GetName(), fault.Get());
 }
+
+// Throws a new fault of class F (one without a path) with the message `what`.
+template <class F>
+[[noreturn]] void ThrowServiceFault(const std::string& what) {
+    Kernite::Ref<F> fault(new F());
+    fault->SetMsg(what);
+    throw typename F::Exception(fault->_GetType()->GetName(), fault.Get());
+}
+
+// Whether the fault blames the caller (SOAP faultcode Client): a refused message,
+// refused credentials or a missing privilege. Every other fault blames the server.
+bool IsClientFault(const MethodFault& fault);
 
 }  // namespace Orbit::Wire
 
@@ -112,4 +143,8 @@ template <> Type* GetType<Wire::InvalidValue>();
 template <> Type* GetType<Wire::LimitExceeded>();
 template <> Type* GetType<Wire::UnknownMethod>();
 template <> Type* GetType<Wire::UnknownVersion>();
+template <> Type* GetType<Wire::UnknownObject>();
+template <> Type* GetType<Wire::NotAuthenticated>();
+template <> Type* GetType<Wire::NotAuthorized>();
+template <> Type* GetType<Wire::ServerFault>();
 }  // namespace Orbit
