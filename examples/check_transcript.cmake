@@ -1,5 +1,6 @@
-# Runs the example and checks that it exits with 0 and that its transcript tells
-# the whole walk: navigation, planting, reading back, removal and the fault.
+# Runs the example (PROGRAM, a command and its arguments) and checks that it exits
+# with 0 and that its transcript tells the whole walk: navigation, planting, reading
+# back, removal, locks, the snapshot tree and the fault.
 execute_process(COMMAND ${PROGRAM} RESULT_VARIABLE code OUTPUT_VARIABLE transcript ERROR_VARIABLE errors)
 message("${transcript}")
 if(NOT code EQUAL 0)
@@ -18,6 +19,9 @@ set(expected
   "client: removeFault(1) -> true"
   "client: removeFault(1) again -> false"
   "client: faults read asynchronously:\nclient: 1 fault(s) planted\nclient:   fault 2 "
+  "client: acquireLock x on 2 objects, twice -> done"
+  "server: saved a tarn.vmprov.VmState under 7"
+  "client: loadDataObject(7) -> a VmState of 5 snapshots, equal to the one saved: true"
   "client: reloadSslCertificate failed with tarn.fault.SecurityConfigFault: no SSL certificate is configured"
   "client: done")
 foreach(line IN LISTS expected)

@@ -1,8 +1,23 @@
 #include "server.h"
 
+#include <algorithm>
+#include <chrono>
+#include <thread>
+#include <vector>
+
 namespace Example {
 
 using Kernite::Ref;
+
+namespace {
+
+[[noreturn]] void Refuse(const std::string& message) {
+    Ref<Orbit::MethodFault> fault(new Orbit::MethodFault());
+    fault->SetMsg(message);
+    throw Orbit::MethodFault::Exception(fault->_GetType()->GetName(), fault.Get());
+}
+
+}  // namespace
 
 void Transcript::Line(const std::string& text) {
     std::lock_guard<std::mutex> lock(_mutex);
@@ -27,9 +42,7 @@ void DebugManagerImpl::MarkLogs(const std::string& message) { _log.Line("server:
 
 void DebugManagerImpl::TraceOperation(Orbit::MoRef*, const Orbit::MethodName& method, Orbit::DataArray<Orbit::Any>*,
                                       Ref<Orbit::MoRef>&) {
-    Ref<Orbit::MethodFault> fault(new Orbit::MethodFault());
-    fault->SetMsg("tracing " + method.GetName() + " is not supported by this server");
-    fault->Throw();
+    Refuse("tracing " + method.GetName() + " is not supported by this server");
 }
 
 void FaultInjectionManagerImpl::GetFaults(Ref<Orbit::DataArray<Tarn::FaultInjector::Fault>>& result) {
@@ -42,11 +55,8 @@ void FaultInjectionManagerImpl::GetFaults(Ref<Orbit::DataArray<Tarn::FaultInject
 
 int FaultInjectionManagerImpl::AddFault(Tarn::FaultInjector::Fault* fault) {
     if (fault == nullptr || fault->GetTarget() == nullptr || fault->GetTrigger() == nullptr ||
-        fault->GetAction() == nullptr) {
-        Ref<Orbit::MethodFault> refused(new Orbit::MethodFault());
-        refused->SetMsg("a fault needs a target, a trigger and an action");
-        refused->Throw();
-    }
+        fault->GetAction() == nullptr)
+        Refuse("a fault needs a target, a trigger and an action");
     Ref<Tarn::FaultInjector::Fault> planted = Orbit::CloneOf(Ref<Tarn::FaultInjector::Fault>(fault));
     int key;
     {
@@ -76,19 +86,98 @@ void SecurityManagerImpl::ReloadSslCertificate() {
     fault->Throw();
 }
 
-Ref<Orbit::MoRef> StartServer(Orbit::LoopbackAdapter* adapter, Transcript& log) {
+std::shared_mutex& LockStresserImpl::LockOf(const std::string& object) {
+    std::lock_guard<std::mutex> lock(_mutex);
+    std::unique_ptr<std::shared_mutex>& slot = _locks[object];
+    if (!slot) slot = std::make_unique<std::shared_mutex>();
+    return *slot;
+}
+
+void LockStresserImpl::AcquireLock(Orbit::DataArray<Orbit::MoRef>* objects, const std::string& mode,
+                                   long long holdDurationMillis, int iters, long long durationBetweenItersMillis) {
+    Ref<Orbit::Any> parsed;
+    try {
+        Kernite::NarrowToType<Orbit::EnumType, Orbit::Type>(Orbit::GetType<Tarn::LockStresser::LockMode>())
+            ->StringToEnum(mode, parsed);
+    } catch (const Kernite::InvalidArgumentException&) {
+        Refuse("no lock mode '" + mode + "'; the modes are x, s, xall and sall");
+    }
+    if (holdDurationMillis < 0 || holdDurationMillis > 10000 || durationBetweenItersMillis < 0 ||
+        durationBetweenItersMillis > 10000 || iters < 0 || iters > 100)
+        Refuse("hold and pause times of 0 to 10000 ms and 0 to 100 iterations, please");
+    // Taken in name order, so that two calls cannot wait for each other.
+    std::vector<std::string> names;
+    for (int i = 0; objects != nullptr && i < objects->GetLength(); ++i)
+        names.push_back(objects->GetAt(i)->ToString());
+    std::sort(names.begin(), names.end());
+    names.erase(std::unique(names.begin(), names.end()), names.end());
+    const bool exclusive = mode == Tarn::LockStresser::LOCKMODE_X || mode == Tarn::LockStresser::LOCKMODE_XALL;
+    for (int i = 0; i < iters; ++i) {
+        if (i > 0) std::this_thread::sleep_for(std::chrono::milliseconds(durationBetweenItersMillis));
+        std::vector<std::shared_mutex*> held;
+        for (const std::string& name : names) {
+            std::shared_mutex& lock = LockOf(name);
+            exclusive ? lock.lock() : lock.lock_shared();
+            held.push_back(&lock);
+        }
+        std::this_thread::sleep_for(std::chrono::milliseconds(holdDurationMillis));
+        for (auto it = held.rbegin(); it != held.rend(); ++it) exclusive ? (*it)->unlock() : (*it)->unlock_shared();
+    }
+}
+
+void DbSerializerManagerImpl::SaveDataObject(int id, Orbit::Any* dataObject) {
+    if (dataObject == nullptr) Refuse("nothing to save");
+    Ref<Orbit::Any> copy = Orbit::CloneOf(Ref<Orbit::Any>(dataObject));
+    {
+        std::lock_guard<std::mutex> lock(_mutex);
+        _objects[id] = copy;
+    }
+    _log.Line("server: saved a " + copy->_GetType()->GetName() + " under " + std::to_string(id));
+}
+
+void DbSerializerManagerImpl::RemoveDataObject(int id, Orbit::Any*) {
+    std::lock_guard<std::mutex> lock(_mutex);
+    _objects.erase(id);
+}
+
+void DbSerializerManagerImpl::LoadDataObject(int id, const std::string& strataType, Ref<Orbit::Any>& result) {
+    Ref<Orbit::Any> stored;
+    {
+        std::lock_guard<std::mutex> lock(_mutex);
+        auto it = _objects.find(id);
+        if (it != _objects.end()) stored = it->second;
+    }
+    if (!stored) {
+        result = nullptr;
+        return;
+    }
+    Orbit::Type* wanted = strataType.empty() ? nullptr : Orbit::GetTypeMap()->GetType(strataType);
+    if (!strataType.empty() && (wanted == nullptr || !stored->_GetType()->IsA(wanted)))
+        Refuse("the object under " + std::to_string(id) + " is a " + stored->_GetType()->GetName() + ", not a " +
+               strataType);
+    result = Orbit::CloneOf(stored);
+}
+
+Ref<Orbit::MoRef> ServiceInstanceReference() {
+    return Ref<Orbit::MoRef>(new Orbit::MoRef("tarn.ServiceInstance", "service-instance"));
+}
+
+Ref<Orbit::MoRef> StartServer(Orbit::ObjectHost* host, Transcript& log) {
     Ref<FaultInjectionManagerImpl> faults(new FaultInjectionManagerImpl("fault-injection-manager", log));
     Ref<DebugManagerImpl> debug(new DebugManagerImpl("debug-manager", faults->_GetRef().Get(), log));
+    Ref<LockStresserImpl> locks(new LockStresserImpl("lock-stresser"));
+    Ref<DbSerializerManagerImpl> store(new DbSerializerManagerImpl("data-object-store", log));
     Ref<SecurityManagerImpl> security(new SecurityManagerImpl("security-manager", log));
-    Ref<ServiceInstanceImpl> instance(
-        new ServiceInstanceImpl("service-instance", debug->_GetRef().Get(), security->_GetRef().Get()));
+    const Ref<Orbit::MoRef> root = ServiceInstanceReference();
+    Ref<ServiceInstanceImpl> instance(new ServiceInstanceImpl(
+        root->GetId(), {debug->_GetRef(), locks->_GetRef(), store->_GetRef(), security->_GetRef()}));
 
     for (Orbit::ManagedObjectImpl* object : std::initializer_list<Orbit::ManagedObjectImpl*>{
-             instance.Get(), debug.Get(), faults.Get(), security.Get()}) {
-        adapter->Register(object->GetId(), object);
+             instance.Get(), debug.Get(), faults.Get(), locks.Get(), store.Get(), security.Get()}) {
+        host->Register(object->GetId(), object);
         log.Line("server: hosting " + object->_GetRef()->ToString());
     }
-    return instance->_GetRef();
+    return root;
 }
 
 std::string Describe(const Tarn::FaultInjector::Fault* fault) {

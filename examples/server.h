@@ -1,15 +1,19 @@
 // The server half of the worked example: a service instance, its debug manager, a
-// fault-injection manager that keeps planted faults in memory, and a security
-// manager without a certificate. Each implementation derives from its generated
-// interface; the runtime dispatches calls to it through the interface's invokeMember.
+// fault-injection manager that keeps planted faults in memory, a lock stresser that
+// takes in-memory locks, a store of data objects in memory, and a security manager
+// without a certificate. Each implementation derives from its generated interface;
+// the runtime dispatches calls to it through the interface's invokeMember. The same
+// objects are hosted in-process (loopback adapter) or by the HTTP server.
 #pragma once
 
 #include <map>
+#include <memory>
 #include <mutex>
 #include <ostream>
+#include <shared_mutex>
 #include <string>
 
-#include "orbit/Loopback.h"
+#include "orbit/Host.h"
 #include "tarn/types.h"
 
 namespace Example {
@@ -28,21 +32,23 @@ private:
 
 class ServiceInstanceImpl : public Orbit::ManagedObjectImpl, public virtual Tarn::ServiceInstance {
 public:
-    ServiceInstanceImpl(const std::string& id, Orbit::MoRef* debugManager, Orbit::MoRef* security)
-        : Orbit::ManagedObjectImpl(id), _debugManager(debugManager), _security(security) {}
+    struct Managers {
+        Kernite::Ref<Orbit::MoRef> debugManager, lockStresser, dbSerializer, security;
+    };
+    ServiceInstanceImpl(const std::string& id, Managers managers)
+        : Orbit::ManagedObjectImpl(id), _managers(std::move(managers)) {}
 
-    void GetDebugManager(Kernite::Ref<Orbit::MoRef>& result) override { result = _debugManager; }
-    void GetSecurity(Kernite::Ref<Orbit::MoRef>& result) override { result = _security; }
+    void GetDebugManager(Kernite::Ref<Orbit::MoRef>& result) override { result = _managers.debugManager; }
+    void GetLockStresser(Kernite::Ref<Orbit::MoRef>& result) override { result = _managers.lockStresser; }
+    void GetDbSerializer(Kernite::Ref<Orbit::MoRef>& result) override { result = _managers.dbSerializer; }
+    void GetSecurity(Kernite::Ref<Orbit::MoRef>& result) override { result = _managers.security; }
     // The managers this server does not run.
-    void GetLockStresser(Kernite::Ref<Orbit::MoRef>& result) override { result = nullptr; }
     void GetProfiler(Kernite::Ref<Orbit::MoRef>& result) override { result = nullptr; }
-    void GetDbSerializer(Kernite::Ref<Orbit::MoRef>& result) override { result = nullptr; }
     void GetHostPicker(Kernite::Ref<Orbit::MoRef>& result) override { result = nullptr; }
     void GetInMemLogBufferManager(Kernite::Ref<Orbit::MoRef>& result) override { result = nullptr; }
 
 private:
-    const Kernite::Ref<Orbit::MoRef> _debugManager;
-    const Kernite::Ref<Orbit::MoRef> _security;
+    const Managers _managers;
 };
 
 class DebugManagerImpl : public Orbit::ManagedObjectImpl, public virtual Tarn::DebugManager {
@@ -88,6 +94,36 @@ private:
     std::map<int, Kernite::Ref<Tarn::FaultInjector::Fault>> _faults;
 };
 
+// Locks named objects in memory: exclusively for "x" and "xall", shared for "s" and
+// "sall", all of a call's objects at once, `iters` times.
+class LockStresserImpl : public Orbit::ManagedObjectImpl, public virtual Tarn::LockStresser {
+public:
+    explicit LockStresserImpl(const std::string& id) : Orbit::ManagedObjectImpl(id) {}
+    void AcquireLock(Orbit::DataArray<Orbit::MoRef>* objects, const std::string& mode, long long holdDurationMillis,
+                     int iters, long long durationBetweenItersMillis) override;
+
+private:
+    std::shared_mutex& LockOf(const std::string& object);
+
+    std::mutex _mutex;
+    std::map<std::string, std::unique_ptr<std::shared_mutex>> _locks;
+};
+
+// Keeps copies of data objects under integer ids, in memory.
+class DbSerializerManagerImpl : public Orbit::ManagedObjectImpl, public virtual Tarn::DbSerializer::DbSerializerManager {
+public:
+    DbSerializerManagerImpl(const std::string& id, Transcript& log) : Orbit::ManagedObjectImpl(id), _log(log) {}
+    void SaveDataObject(int id, Orbit::Any* dataObject) override;
+    void RemoveDataObject(int id, Orbit::Any* dataObject) override;
+    // `strataType`, when given, must be the stored object's type or one of its bases.
+    void LoadDataObject(int id, const std::string& strataType, Kernite::Ref<Orbit::Any>& result) override;
+
+private:
+    Transcript& _log;
+    std::mutex _mutex;
+    std::map<int, Kernite::Ref<Orbit::Any>> _objects;
+};
+
 class SecurityManagerImpl : public Orbit::ManagedObjectImpl, public virtual Tarn::SecurityManager {
 public:
     SecurityManagerImpl(const std::string& id, Transcript& log) : Orbit::ManagedObjectImpl(id), _log(log) {}
@@ -98,9 +134,11 @@ private:
     Transcript& _log;
 };
 
-// Hosts the four objects on `adapter` and returns the service instance's reference,
-// the one thing a client needs to know to start.
-Kernite::Ref<Orbit::MoRef> StartServer(Orbit::LoopbackAdapter* adapter, Transcript& log);
+// The service instance's reference, the one thing a client needs to know to start.
+Kernite::Ref<Orbit::MoRef> ServiceInstanceReference();
+
+// Hosts the objects on `host` and returns the service instance's reference.
+Kernite::Ref<Orbit::MoRef> StartServer(Orbit::ObjectHost* host, Transcript& log);
 
 // How a fault reads in the transcript: "fault 1 'copy' on name 'x' at 50%: throws strata.MethodFault".
 std::string Describe(const Tarn::FaultInjector::Fault* fault);
