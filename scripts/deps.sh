@@ -6,6 +6,7 @@ packages=(g++ cmake ninja-build libboost-dev libgtest-dev libgmock-dev libbenchm
           nlohmann-json3-dev  # the tests read tarn-catalog's JSON with it
           libprotobuf-dev protobuf-compiler  # the benchmarks' side-by-side twin
           libpugixml-dev python3-zeep  # the wire's XML parser; the SOAP client that reads its WSDL
+          libssl-dev openssl  # TLS of the HTTP transport; the tests make their certificates with openssl
           clang-14 libclang-rt-14-dev)  # clang and its libFuzzer, for the fuzz preset
 if [ "${1:-}" = test ]; then
   packages+=(pkgconf                     # the installed package, consumed through pkg-config
