@@ -1,4 +1,6 @@
-// Every registered type's records, field by field, against what the catalogue says.
+// Every registered type's records, field by field, against what the catalogue says:
+// the library's catalogue (catalog-tests) and the runtime's test catalogue
+// (fixture-records-tests), the same test on each.
 // The catalogue is read with the generator's own parser; the defaults the catalogue
 // format gives (wsdl name, a parameter's version, a missing result) are applied
 // here from idl/README.md, so that a wrong default in the generator shows.
@@ -198,18 +200,19 @@ TEST(Records, SetAndUnsetFollowEachPropertysFlags) {
 TEST(Records, TheLoadersRegisteredEveryTypeOnceInLoaderOrder) {
     const Model& model = Read().model;
     std::vector<std::string> expected, registered;
-    std::set<std::string> all;
+    std::set<std::string> all, standins;
     long units = 0;
     for (const auto& unit : model.units) {
         units += unit->standin ? 0 : 1;
         for (const Type* t : unit->RegistrationOrder()) {
-            if (!unit->standin) expected.push_back(t->wireName);
+            if (unit->standin) standins.insert(t->wireName);
+            else expected.push_back(t->wireName);
             all.insert(t->wireName);
         }
     }
     for (Orbit::Type* t : Orbit::GetTypeMap()->GetTypes()) {
         EXPECT_EQ(all.erase(t->GetName()), 1u) << t->GetName() << " registered twice, or not catalogued";
-        if (t->GetName().starts_with("tarn.")) registered.push_back(t->GetName());
+        if (!standins.count(t->GetName())) registered.push_back(t->GetName());
     }
     EXPECT_TRUE(all.empty()) << all.size() << " catalogued types are not registered, " << *all.begin();
     EXPECT_EQ(registered, expected);

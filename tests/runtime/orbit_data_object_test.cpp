@@ -3,8 +3,10 @@
 // differences along the base chain, deep copies, sizes, and thrown faults.
 #include <gtest/gtest.h>
 
+#include <cstring>
 #include <functional>
 #include <memory>
+#include <new>
 
 #include "fixtures.h"
 
@@ -175,10 +177,15 @@ TEST_F(DataObjectTest, ComparisonFollowsTheBaseChainAndTheType) {
 }
 
 TEST_F(DataObjectTest, ConstructorsAndCopiesShareNothing) {
-    Ref<Shape> blank = Make<Shape>();
+    // Made over dirty memory, so that a member the constructor leaves alone shows.
+    alignas(Circle) unsigned char storage[sizeof(Circle)];
+    std::memset(storage, 0xA5, sizeof storage);
+    Circle* blank = new (storage) Circle();
     EXPECT_EQ(blank->GetCount(), 0);
     EXPECT_EQ(blank->GetColor(), Color::red);
+    EXPECT_EQ(blank->GetRadius(), 0.0);
     EXPECT_FALSE(blank->GetNote().IsSet());
+    blank->~Circle();
 
     Ref<Shape> full = Full();
     for (Ref<Shape> copy : {Make<Shape>(*full), Ref<Shape>(static_cast<Shape*>(full->_Clone()))}) {

@@ -88,9 +88,10 @@ TEST_F(ValuesTest, ObjectArraysInsertSetAndCopyDeeply) {
     EXPECT_EQ(a->GetLabel(), "a");
     EXPECT_FALSE(copy->_IsEqual(shapes.Get()));
     EXPECT_EQ(Diff(shapes.Get(), copy.Get(), "list"), std::vector<std::string>{"list[1].label"});
-    copy->RemoveAt(2);
-    EXPECT_FALSE(copy->_IsEqual(shapes.Get())) << "a shorter array";
-    EXPECT_FALSE(shapes->_IsEqual(copy.Get())) << "a longer array";
+    Ref<DataArray<Shape>> shorter(static_cast<DataArray<Shape>*>(shapes->_Clone()));
+    shorter->RemoveAt(2);  // equal as far as it goes
+    EXPECT_FALSE(shorter->_IsEqual(shapes.Get())) << "a shorter array";
+    EXPECT_FALSE(shapes->_IsEqual(shorter.Get())) << "a longer array";
 
     shapes->CheckedSetAt(1, b.Get());
     EXPECT_EQ(a->GetRefCount(), 1);
