@@ -23,7 +23,10 @@ function(tarn_keep_loaded target)
     # An exported copy gets its own from the package's config file.
     set(option "$<BUILD_INTERFACE:${option}>")
   endif()
-  set_property(TARGET ${target} APPEND PROPERTY INTERFACE_LINK_OPTIONS "${option}")
+  get_target_property(options ${target} INTERFACE_LINK_OPTIONS)
+  if(NOT "${option}" IN_LIST options)  # find_package may run more than once in a directory
+    set_property(TARGET ${target} APPEND PROPERTY INTERFACE_LINK_OPTIONS "${option}")
+  endif()
 endfunction()
 
 function(tarn_generate)
