@@ -1,18 +1,20 @@
 # What `cmake --install` puts under the prefix: the libraries with their headers
 # below one include root, tarn-gen and tarn-catalog, the CMake package Tarn
 # (targets Tarn::kernite, Tarn::orbit, Tarn::standins, Tarn::types, Tarn::testing,
-# Tarn::wire and tarn_generate) and a pkg-config file per library.
+# Tarn::wire, Tarn::http and tarn_generate) and a pkg-config file per library.
 include(CMakePackageConfigHelpers)
 
 set(tarn_libraries kernite orbit)
-if(TARGET orbit-wire)
-  list(APPEND tarn_libraries orbit-wire)
-endif()
+foreach(library orbit-wire orbit-http)
+  if(TARGET ${library})
+    list(APPEND tarn_libraries ${library})
+  endif()
+endforeach()
 if(NOT TARN_RUNTIME_ONLY)
   list(APPEND tarn_libraries tarn-standins tarn-types tarn-types-testing)
 endif()
 foreach(library IN LISTS tarn_libraries)
-  # kernite, orbit, wire, standins, types, testing
+  # kernite, orbit, wire, http, standins, types, testing
   string(REGEX REPLACE "^(orbit-|tarn-types-|tarn-)" "" name ${library})
   set_target_properties(${library} PROPERTIES EXPORT_NAME ${name} VERSION ${PROJECT_VERSION}
                         SOVERSION ${PROJECT_VERSION_MAJOR}.${PROJECT_VERSION_MINOR})
@@ -49,7 +51,7 @@ install(FILES ${PROJECT_BINARY_DIR}/TarnConfig.cmake ${PROJECT_BINARY_DIR}/TarnC
               ${CMAKE_CURRENT_LIST_DIR}/TarnGenerate.cmake
         DESTINATION ${config_dir})
 
-# pkg-config: tarn-kernite, tarn-orbit, tarn-wire, tarn-types, tarn-types-testing.
+# pkg-config: tarn-kernite, tarn-orbit, tarn-wire, tarn-http, tarn-types, tarn-types-testing.
 # They find the prefix from their own place, so an installed tree can move.
 file(RELATIVE_PATH pc_up /prefix/${CMAKE_INSTALL_LIBDIR}/pkgconfig /prefix)
 function(tarn_pkg_config file name description requires libs private)
@@ -65,6 +67,9 @@ tarn_pkg_config(tarn-kernite "Kernite" "Core object library of libtarn-types" ""
 tarn_pkg_config(tarn-orbit "Orbit" "Object-model runtime of libtarn-types" "tarn-kernite" "-lorbit" "")
 if(TARGET orbit-wire)
   tarn_pkg_config(tarn-wire "Orbit wire" "SOAP codec of the Orbit runtime" "tarn-orbit" "-lorbit-wire" "")
+endif()
+if(TARGET orbit-http)
+  tarn_pkg_config(tarn-http "Orbit HTTP" "SOAP over HTTP and TLS for the Orbit runtime" "tarn-wire" "-lorbit-http" "")
 endif()
 if(NOT TARN_RUNTIME_ONLY)
   # The library registers its types when it loads, so it stays linked even where a

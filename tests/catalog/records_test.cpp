@@ -13,7 +13,7 @@
 #include <sstream>
 
 #include "model.h"
-#include "tarn/types.h"
+#include "orbit/Orbit.h"
 #include "values.h"
 
 namespace {
