@@ -262,8 +262,7 @@ private:
                                                     std::to_string(_core.settings.callTimeout.count()) + " ms, " +
                                                     doing + where);
         else
-            failure = std::make_unique<TransportError>("the connection failed while " + doing + ": " + ec.message() +
-                                                       where);
+            failure = std::make_unique<TransportError>(doing + " failed: " + ec.message() + where);
         _core.Release(shared_from_this(), false);
         _core.Finish(*call, std::move(failure), {});
     }

@@ -67,7 +67,7 @@ struct HttpServer::Impl {
     std::unordered_map<Session*, std::weak_ptr<Session>> sessions;
 
     // Destroyed first: the handlers still queued hold sessions, which Forget() themselves.
-    net::io_context io{1};
+    net::io_context io;
     std::optional<net::executor_work_guard<net::io_context::executor_type>> work;
     tcp::acceptor acceptor{net::make_strand(io)};
     std::vector<std::thread> workers;
