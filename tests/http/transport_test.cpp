@@ -77,6 +77,16 @@ protected:
     }
     static void TearDownTestSuite() { std::filesystem::remove_all(folder); }
 
+    static ServerSettings WithTokens() {
+        ServerSettings settings;
+        settings.authorizer = Tokens;
+        return settings;
+    }
+    static ClientSettings Bearing(const char* token) {
+        ClientSettings settings;
+        settings.bearerToken = token;
+        return settings;
+    }
     void Serve(ServerSettings settings) {
         server = std::make_unique<HttpServer>(std::move(settings));
         server->Register("probe", probe.Get());
@@ -113,15 +123,13 @@ protected:
 };
 
 TEST_F(Transport, TlsVerifiesTheServerAgainstTheCaGiven) {
-    ServerSettings settings;
-    settings.authorizer = Tokens;
+    ServerSettings settings = WithTokens();
     settings.certificateFile = (folder / "server.pem").string();
     settings.privateKeyFile = (folder / "server.key").string();
     Serve(settings);
     ASSERT_EQ(server->Url().rfind("https://127.0.0.1:", 0), 0u) << server->Url();
 
-    ClientSettings right;
-    right.bearerToken = "operator-token";
+    ClientSettings right = Bearing("operator-token");
     right.caFile = (folder / "ca.pem").string();
     Lock(Client(right).Get());
     EXPECT_EQ(probe->calls, 1);
@@ -152,8 +160,7 @@ TEST_F(Transport, TlsVerifiesTheServerAgainstTheCaGiven) {
 }
 
 TEST_F(Transport, BasicCredentialsNeverTravelOverPlainHttpUnlessAllowed) {
-    ServerSettings settings;
-    settings.authorizer = Tokens;
+    ServerSettings settings = WithTokens();
     Serve(settings);
     ClientSettings basic;
     basic.basicUser = "basic-user";
@@ -180,20 +187,15 @@ TEST_F(Transport, PrivilegesAreCheckedBeforeAnyArgumentAndIdentityReachesTheImpl
     // Without an authorizer, every privileged member is refused, credentials or not.
     EXPECT_NE(FaultOf<NotAuthorized>(Client(anonymous).Get()).find("needs the privilege Global.HubServer"),
               std::string::npos);
-    ClientSettings operatorToken;
-    operatorToken.bearerToken = "operator-token";
+    const ClientSettings operatorToken = Bearing("operator-token");
     FaultOf<NotAuthorized>(Client(operatorToken).Get());
 
     server.reset();
     settings.authorizer = Tokens;
     Serve(settings);
     FaultOf<NotAuthorized>(Client(anonymous).Get());
-    ClientSettings observer;
-    observer.bearerToken = "observer-token";
-    FaultOf<NotAuthorized>(Client(observer).Get());
-    ClientSettings forged;
-    forged.bearerToken = "forged-token";
-    EXPECT_EQ(FaultOf<NotAuthenticated>(Client(forged).Get()), "the credentials were refused");
+    FaultOf<NotAuthorized>(Client(Bearing("observer-token")).Get());
+    EXPECT_EQ(FaultOf<NotAuthenticated>(Client(Bearing("forged-token")).Get()), "the credentials were refused");
     EXPECT_EQ(probe->calls, 0);
 
     Lock(Client(operatorToken).Get());
@@ -214,12 +216,8 @@ TEST_F(Transport, PrivilegesAreCheckedBeforeAnyArgumentAndIdentityReachesTheImpl
 }
 
 TEST_F(Transport, FailuresOfTheServerReachTheCallerAsFaults) {
-    ServerSettings settings;
-    settings.authorizer = Tokens;
-    Serve(settings);
-    ClientSettings operatorToken;
-    operatorToken.bearerToken = "operator-token";
-    Ref<HttpAdapter> adapter = Client(operatorToken);
+    Serve(WithTokens());
+    Ref<HttpAdapter> adapter = Client(Bearing("operator-token"));
 
     // An implementation's own exception keeps its message; the server goes on.
     EXPECT_EQ(FaultOf<ServerFault>(adapter.Get(), "throw"), "disk on fire");
@@ -237,12 +235,10 @@ TEST_F(Transport, FailuresOfTheServerReachTheCallerAsFaults) {
 }
 
 TEST_F(Transport, TimeoutsLostConnectionsAndAGracefulStop) {
-    ServerSettings settings;
-    settings.authorizer = Tokens;
+    ServerSettings settings = WithTokens();
     settings.idleTimeout = 150ms;
     Serve(settings);
-    ClientSettings quick;
-    quick.bearerToken = "operator-token";
+    ClientSettings quick = Bearing("operator-token");
     quick.callTimeout = 200ms;
     quick.maxConnections = 1;
     Ref<HttpAdapter> adapter = Client(quick);
