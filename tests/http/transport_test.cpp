@@ -9,6 +9,7 @@
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
+#include <future>
 #include <stdexcept>
 #include <thread>
 
@@ -274,6 +275,35 @@ TEST_F(Transport, TimeoutsLostConnectionsAndAGracefulStop) {
     Serve(settings);
     Lock(dropped.Get());
     EXPECT_EQ(probe->calls, 5);
+}
+
+// As with the loopback adapter, the last reference to the adapter may go, and the
+// adapter may be shut down, inside one of its own completion callbacks.
+TEST_F(Transport, TheAdapterMayEndInsideItsOwnCallback) {
+    Serve(WithTokens());
+    Ref<Orbit::MoRef> ref(new Orbit::MoRef("tarn.LockStresser", "probe"));
+    Ref<Orbit::DataArray<Orbit::MoRef>> none(new Orbit::DataArray<Orbit::MoRef>());
+    for (bool shutdownFirst : {false, true}) {
+        Ref<HttpAdapter> adapter = Client(Bearing("operator-token"));
+        Ref<Tarn::LockStresserStub> stub = adapter->StubFor<Tarn::LockStresserStub>(ref.Get());
+        std::promise<bool> outcome;
+        Ref<Kernite::System::ScheduledItem> item;
+        stub->AcquireLock(
+            none.Get(), "x", 0, 1, 0,
+            [&, shutdownFirst, held = std::move(adapter)](Kernite::System::ScheduledItem*, Kernite::Exception* e,
+                                                            Orbit::Any*) mutable {
+                if (shutdownFirst) held->Shutdown();
+                EXPECT_THROW(Lock(held.Get()), Kernite::Exception);  // no synchronous call from here
+                held = nullptr;
+                stub = nullptr;
+                outcome.set_value(e == nullptr);
+            },
+            item);
+        EXPECT_TRUE(outcome.get_future().get());
+        item->Wait();
+        EXPECT_FALSE(item->IsFailed());
+    }
+    EXPECT_EQ(probe->calls, 2);
 }
 
 }  // namespace
