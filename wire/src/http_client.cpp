@@ -3,6 +3,7 @@
 #include <openssl/err.h>
 #include <openssl/evp.h>
 #include <openssl/ssl.h>
+#include <poll.h>
 #include <sys/socket.h>
 
 #include <atomic>
@@ -99,6 +100,11 @@ struct HttpAdapter::Core : std::enable_shared_from_this<HttpAdapter::Core> {
     Core(const ClientSettings& s, const Version& v) : settings(s), url(ParseUrl(s.url)), codec(v, s.limits) {}
     ~Core();
 
+    // A connection for `call`: an idle one that still works, else a new one while
+    // fewer than the most are open (`fresh`); else the call waits for one and this
+    // answers null. Counts the call in flight.
+    std::shared_ptr<Connection> Acquire(std::shared_ptr<Call>& call, bool& fresh);
+    // Acquires, and runs the call on the connection's strand.
     void Submit(std::shared_ptr<Call> call);
     void Release(const std::shared_ptr<Connection>& connection, bool reusable);
     void Finish(Call& call, std::unique_ptr<Kernite::Exception> failure, Reply reply);
@@ -132,13 +138,13 @@ namespace {
 class Connection : public std::enable_shared_from_this<Connection> {
 public:
     explicit Connection(HttpAdapter::Core& core)
-        : _core(core), _resolver(net::make_strand(core.io)),
-          _stream(_resolver.get_executor(), core.tls ? &*core.tls : nullptr) {
+        : _core(core), _strand(net::make_strand(core.io)), _resolver(_strand),
+          _stream(_strand, core.tls ? &*core.tls : nullptr) {
         ++_core.connections;
     }
     ~Connection() { --_core.connections; }
 
-    net::any_io_executor Executor() { return _resolver.get_executor(); }
+    const Strand& Executor() const { return _strand; }
 
     // Whether an idle connection can carry a call: not idle too long, and not closed
     // (or written to) by the server meanwhile. Called under the core's lock while
@@ -173,6 +179,13 @@ public:
 
     void Close() { _stream.Close(); }
 
+    // Plain TCP that carried a call before: a synchronous call can run on its own
+    // thread, sparing two thread switches a call.
+    bool CanCallHere() const { return _connected && !_stream.IsTls(); }
+    // The call, done on the calling thread with the socket's non-blocking operations
+    // and poll() for the deadline. Whether the connection can be used again.
+    bool CallHere(Call& call, Reply& reply, std::unique_ptr<Kernite::Exception>& failure);
+
 private:
     void Connect(const tcp::resolver::results_type& found) {
         _stream.Lowest().async_connect(found, [self = shared_from_this()](beast::error_code ec, const tcp::endpoint&) {
@@ -205,16 +218,7 @@ private:
     }
 
     void Send() {
-        _request.emplace(http::verb::post, _core.url.target, 11);
-        http::request<http::string_body>& r = *_request;
-        r.set(http::field::host, _core.url.hostField);
-        r.set(http::field::user_agent, "orbit-http-client");
-        r.set(http::field::content_type, "text/xml; charset=utf-8");
-        r.set("SOAPAction", _core.soapAction);
-        if (!_core.authorization.empty()) r.set(http::field::authorization, _core.authorization);
-        r.keep_alive(true);
-        r.body() = std::move(_call->request);
-        r.prepare_payload();
+        Prepare(*_call);
         _stream.With([this](auto& stream) {
             http::async_write(stream, *_request, [self = shared_from_this()](beast::error_code ec, std::size_t) {
                 self->_request.reset();
@@ -224,9 +228,23 @@ private:
         });
     }
 
-    void Receive() {
+    // The request and the parser of its answer.
+    void Prepare(Call& call) {
+        _request.emplace(http::verb::post, _core.url.target, 11);
+        http::request<http::string_body>& r = *_request;
+        r.set(http::field::host, _core.url.hostField);
+        r.set(http::field::user_agent, "orbit-http-client");
+        r.set(http::field::content_type, "text/xml; charset=utf-8");
+        r.set("SOAPAction", _core.soapAction);
+        if (!_core.authorization.empty()) r.set(http::field::authorization, _core.authorization);
+        r.keep_alive(true);
+        r.body() = std::move(call.request);
+        r.prepare_payload();
         _parser.emplace();
         _parser->body_limit(_core.settings.limits.maxBodyBytes);
+    }
+
+    void Receive() {
         _stream.With([this](auto& stream) {
             http::async_read(stream, _buffer, *_parser, [self = shared_from_this()](beast::error_code ec, std::size_t) {
                 if (ec) return self->Fail(ec, "reading the answer");
@@ -236,39 +254,47 @@ private:
     }
 
     void Received() {
+        Reply reply;
+        const bool reusable = Take(reply);
+        std::shared_ptr<Call> call = std::move(_call);
+        _core.Release(shared_from_this(), reusable);
+        _core.Finish(*call, nullptr, std::move(reply));
+    }
+
+    // The answer parsed; whether the connection stays open.
+    bool Take(Reply& reply) {
         http::response<http::string_body> response = _parser->release();
         _parser.reset();
-        Reply reply;
         reply.status = response.result_int();
         reply.contentType = std::string(response[http::field::content_type]);
         reply.body = std::move(response.body());
-        std::shared_ptr<Call> call = std::move(_call);
-        const bool reusable = response.keep_alive();
-        if (!reusable) Close();
-        _core.Release(shared_from_this(), reusable);
-        _core.Finish(*call, nullptr, std::move(reply));
+        if (!response.keep_alive()) Close();
+        return response.keep_alive();
+    }
+
+    std::unique_ptr<Kernite::Exception> Failure(beast::error_code ec, const std::string& doing, const Call& call) {
+        Close();
+        _connected = false;
+        const std::string where = " (" + _core.url.hostField + ", " + call.name + ")";
+        if (ec == beast::error::timeout)
+            return std::make_unique<CallTimeout>("the call timed out after " +
+                                                 std::to_string(_core.settings.callTimeout.count()) + " ms, " + doing +
+                                                 where);
+        return std::make_unique<TransportError>(doing + " failed: " + ec.message() + where);
     }
 
     // The call fails, and so does the connection: it is closed, the next call opens
     // another.
     void Fail(beast::error_code ec, const std::string& doing) {
-        Close();
-        _connected = false;
         std::shared_ptr<Call> call = std::move(_call);
-        const std::string where = " (" + _core.url.hostField + ", " + call->name + ")";
-        std::unique_ptr<Kernite::Exception> failure;
-        if (ec == beast::error::timeout)
-            failure = std::make_unique<CallTimeout>("the call timed out after " +
-                                                    std::to_string(_core.settings.callTimeout.count()) + " ms, " +
-                                                    doing + where);
-        else
-            failure = std::make_unique<TransportError>(doing + " failed: " + ec.message() + where);
+        std::unique_ptr<Kernite::Exception> failure = Failure(ec, doing, *call);
         _core.Release(shared_from_this(), false);
         _core.Finish(*call, std::move(failure), {});
     }
 
     HttpAdapter::Core& _core;
-    tcp::resolver _resolver;
+    Strand _strand;
+    tcp::resolver::rebind_executor<Strand>::other _resolver;
     Stream _stream;
     bool _connected = false;
     Clock::time_point _idleSince;
@@ -277,6 +303,46 @@ private:
     std::optional<http::request<http::string_body>> _request;
     std::optional<http::response_parser<http::string_body>> _parser;
 };
+
+bool Connection::CallHere(Call& call, Reply& reply, std::unique_ptr<Kernite::Exception>& failure) {
+    Socket& socket = _stream.Lowest().socket();
+    beast::error_code ec;
+    if (!socket.non_blocking()) socket.non_blocking(true, ec);
+    // Waits until the socket is ready for `events`; false once the deadline passed.
+    auto ready = [&](short events) {
+        for (;;) {
+            const auto left = std::chrono::ceil<std::chrono::milliseconds>(call.deadline - Clock::now()).count();
+            if (left <= 0) return false;
+            pollfd p{socket.native_handle(), events, 0};
+            const int n = ::poll(&p, 1, static_cast<int>(std::min<long long>(left, 1 << 30)));
+            if (n > 0) return true;
+            if (n < 0 && errno != EINTR) return true;  // the next operation reports it
+        }
+    };
+    auto blocked = [](const beast::error_code& e) {
+        return e == net::error::would_block || e == net::error::try_again;
+    };
+    Prepare(call);
+    http::serializer<true, http::string_body> serializer(*_request);
+    while (!ec && !serializer.is_done()) {
+        http::write_some(socket, serializer, ec);
+        if (blocked(ec)) ec = ready(POLLOUT) ? beast::error_code() : beast::error::timeout;
+    }
+    _request.reset();
+    if (ec) {
+        failure = Failure(ec, "sending the request", call);
+        return false;
+    }
+    while (!ec && !_parser->is_done()) {
+        http::read_some(socket, _buffer, *_parser, ec);
+        if (blocked(ec)) ec = ready(POLLIN) ? beast::error_code() : beast::error::timeout;
+    }
+    if (ec) {
+        failure = Failure(ec, "reading the answer", call);
+        return false;
+    }
+    return Take(reply);
+}
 
 }  // namespace
 
@@ -294,9 +360,10 @@ void HttpAdapter::Core::Start(const std::shared_ptr<Connection>& connection, std
     net::post(connection->Executor(), [connection, call = std::move(call)]() mutable { connection->Run(std::move(call)); });
 }
 
-void HttpAdapter::Core::Submit(std::shared_ptr<Call> call) {
+std::shared_ptr<Connection> HttpAdapter::Core::Acquire(std::shared_ptr<Call>& call, bool& fresh) {
     std::vector<std::shared_ptr<Connection>> stale;
     std::shared_ptr<Connection> connection;
+    fresh = false;
     {
         std::lock_guard<std::mutex> lock(mutex);
         if (stopping) throw Kernite::Exception("the HTTP adapter is shut down");
@@ -315,11 +382,17 @@ void HttpAdapter::Core::Submit(std::shared_ptr<Call> call) {
         if (!connection && open < settings.maxConnections) {
             ++open;
             connection = std::make_shared<Connection>(*this);
+            fresh = true;
         }
         if (!connection) waiting.push_back(std::move(call));
     }
     for (std::shared_ptr<Connection>& old : stale) net::post(old->Executor(), [old] { old->Close(); });
-    if (connection) Start(connection, std::move(call));
+    return connection;
+}
+
+void HttpAdapter::Core::Submit(std::shared_ptr<Call> call) {
+    bool fresh;
+    if (std::shared_ptr<Connection> connection = Acquire(call, fresh)) Start(connection, std::move(call));
 }
 
 void HttpAdapter::Core::Release(const std::shared_ptr<Connection>& connection, bool reusable) {
@@ -434,7 +507,17 @@ void HttpAdapter::Invoke(const std::string& id, ManagedMethod* method, Kernite::
         outcome->done = true;
         outcome->ready.notify_one();
     };
-    _core->Submit(std::move(call));
+    bool fresh;
+    std::shared_ptr<Connection> connection = _core->Acquire(call, fresh);
+    if (connection && connection->CanCallHere()) {
+        Reply reply;
+        std::unique_ptr<Kernite::Exception> failure;
+        const bool reusable = connection->CallHere(*call, reply, failure);
+        _core->Release(connection, reusable);
+        _core->Finish(*call, std::move(failure), std::move(reply));
+    } else if (connection) {
+        _core->Start(connection, call);
+    }
     std::unique_lock<std::mutex> lock(outcome->mutex);
     outcome->ready.wait(lock, [&] { return outcome->done; });
     if (outcome->failure) outcome->failure->Throw();

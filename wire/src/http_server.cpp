@@ -35,7 +35,7 @@ bool IsHttpError(const beast::error_code& ec) {
     return ec.category() == http::make_error_code(http::error::bad_target).category();
 }
 
-std::string PeerOf(const tcp::socket& socket) {
+std::string PeerOf(const Socket& socket) {
     beast::error_code ec;
     const tcp::endpoint peer = socket.remote_endpoint(ec);
     return ec ? std::string("?") : peer.address().to_string() + ":" + std::to_string(peer.port());
@@ -49,7 +49,7 @@ struct HttpServer::Impl {
     Impl(const ObjectHost& host, ServerSettings s) : settings(std::move(s)), calls(host, settings) {}
 
     void Accept();
-    void OnAccept(beast::error_code ec, tcp::socket socket);
+    void OnAccept(beast::error_code ec, Socket socket);
     void Forget(Session* session);
     Response Serve(const http::request<http::string_body>& request, const std::string& peer);
     Answer Wsdl(std::string_view query);
@@ -79,11 +79,11 @@ namespace {
 // timeout), answer (write timeout), again while the connection is kept alive.
 class Session : public std::enable_shared_from_this<Session> {
 public:
-    Session(HttpServer::Impl& server, tcp::socket&& socket)
+    Session(HttpServer::Impl& server, Socket&& socket)
         : _server(server), _peer(PeerOf(socket)), _stream(std::move(socket), server.tls ? &*server.tls : nullptr) {}
     ~Session() { _server.Forget(this); }
 
-    net::any_io_executor Executor() { return _stream.Lowest().get_executor(); }
+    Strand Executor() { return _stream.Lowest().get_executor(); }
 
     void Start() {
         if (!_stream.IsTls()) return ReadHeader();
@@ -246,12 +246,12 @@ private:
 }  // namespace
 
 void HttpServer::Impl::Accept() {
-    acceptor.async_accept(net::make_strand(io), [this](beast::error_code ec, tcp::socket socket) {
+    acceptor.async_accept(net::make_strand(io), [this](beast::error_code ec, Socket socket) {
         OnAccept(ec, std::move(socket));
     });
 }
 
-void HttpServer::Impl::OnAccept(beast::error_code ec, tcp::socket socket) {
+void HttpServer::Impl::OnAccept(beast::error_code ec, Socket socket) {
     if (!acceptor.is_open() || ec == net::error::operation_aborted) return;
     if (!ec) {
         std::shared_ptr<Session> session;
@@ -391,7 +391,7 @@ void HttpServer::Stop() {
                 if (std::shared_ptr<Session> session = entry.second.lock()) live.push_back(std::move(session));
         }
         for (std::shared_ptr<Session>& session : live) {
-            net::any_io_executor executor = session->Executor();
+            Strand executor = session->Executor();
             net::post(executor, [session = std::move(session), force] { session->Stop(force); });
         }
     };

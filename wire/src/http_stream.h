@@ -19,24 +19,28 @@ namespace net = boost::asio;
 namespace ssl = net::ssl;
 using tcp = net::ip::tcp;
 using Clock = std::chrono::steady_clock;
+// Concrete executor types rather than type-erased ones: a call crosses them often.
+using Strand = net::strand<net::io_context::executor_type>;
+using TcpStream = beast::basic_stream<tcp, Strand>;
+using Socket = TcpStream::socket_type;
 
 class Stream {
 public:
     // A connection accepted by a server, TLS when `tls` is given.
-    Stream(tcp::socket&& socket, ssl::context* tls) {
+    Stream(Socket&& socket, ssl::context* tls) {
         if (tls) _tls.emplace(std::move(socket), *tls);
         else _plain.emplace(std::move(socket));
     }
     // A client's connection, not connected yet.
-    Stream(const net::any_io_executor& executor, ssl::context* tls) {
+    Stream(const Strand& executor, ssl::context* tls) {
         if (tls) _tls.emplace(executor, *tls);
         else _plain.emplace(executor);
     }
 
     bool IsTls() const noexcept { return _tls.has_value(); }
-    beast::ssl_stream<beast::tcp_stream>& Tls() { return *_tls; }
+    beast::ssl_stream<TcpStream>& Tls() { return *_tls; }
     // The TCP stream under it all, which holds the timeouts.
-    beast::tcp_stream& Lowest() { return _tls ? beast::get_lowest_layer(*_tls) : *_plain; }
+    TcpStream& Lowest() { return _tls ? beast::get_lowest_layer(*_tls) : *_plain; }
 
     // Calls `operation` with the stream the HTTP messages travel on.
     template <class Operation>
@@ -51,8 +55,8 @@ public:
     }
 
 private:
-    std::optional<beast::tcp_stream> _plain;
-    std::optional<beast::ssl_stream<beast::tcp_stream>> _tls;
+    std::optional<TcpStream> _plain;
+    std::optional<beast::ssl_stream<TcpStream>> _tls;
 };
 
 }  // namespace Orbit::Wire
