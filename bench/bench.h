@@ -6,6 +6,7 @@
 #include <benchmark/benchmark.h>
 
 #include <cstdint>
+#include <cstddef>
 #include <string>
 #include <vector>
 
@@ -60,10 +61,35 @@ inline const std::string kHostIp = "10.20.30.40";
 inline const std::string kHostThumbprint = "3F:2A:9C:11:7B:D4:0E:55:A1:6C:92:BB:E0:4D:73:18:C5:2F:09:AE";
 inline const std::string kHostSwap = "vmDirectory";
 
-// The enumeration look-ups: the four tags in value order, and one that is not a tag.
-inline const std::string kLockTags[] = {"x", "s", "xall", "sall"};
-inline const std::string kUnknownTag = "exclusive";
+// The enumeration look-ups, one unknown in five: the four tags and one that is not a
+// tag; the four values and one past them. Each operation sums what it finds, -1 for
+// the unknown one, so the sum of the values is 0+1+2+3-1 = 5 and the tags' lengths
+// add up to 10.
+inline const std::string kLockTags[] = {"x", "s", "exclusive", "xall", "sall"};
+constexpr int kLockValues[] = {0, 1, 4, 2, 3};
+constexpr int kLockValueSum = 5;
+constexpr std::size_t kLockTagLength = 10;
 
+// A location: 8 datastores; its host has 8 mount infos and 4 option definitions.
 constexpr int kDatastores = 8;
+constexpr int kMounts = 8;
+constexpr int kOptions = 4;
+
+// The outside records' texts, made before timing.
+struct OutsideTexts {
+    OutsideTexts();
+    std::vector<std::string> mountPaths;   // "/slate/volumes/store-<i>"
+    std::vector<std::string> optionKeys;   // "config.host.option<i>"
+    std::vector<std::string> optionLabels;
+    std::vector<std::string> storeNames;
+    std::vector<std::string> storeUrls;
+};
+const OutsideTexts& Outside();
+inline const std::string kProductName = "Slate Host Agent";
+inline const std::string kProductFullName = "Slate Host Agent 7.1.2 build-20231114";
+inline const std::string kProductVersion = "7.1.2";
+inline const std::string kProductBuild = "20231114";
+inline const std::string kAccessMode = "readWrite";
+inline const std::string kOptionSummary = "Applies to every virtual machine placed on this host";
 
 }  // namespace TarnBench

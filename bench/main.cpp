@@ -93,6 +93,23 @@ const TreeTexts& TextsFor(int n) {
     return *slot;
 }
 
+OutsideTexts::OutsideTexts() {
+    for (int i = 0; i < kMounts; ++i) mountPaths.push_back("/slate/volumes/store-" + std::to_string(i));
+    for (int i = 0; i < kOptions; ++i) {
+        optionKeys.push_back("config.host.option" + std::to_string(i));
+        optionLabels.push_back("Host option number " + std::to_string(i));
+    }
+    for (int i = 0; i < 100; ++i) {
+        storeNames.push_back("store-" + std::to_string(i));
+        storeUrls.push_back("slatestore:///volumes/5f2a9c11-" + std::to_string(1000 + i) + "/");
+    }
+}
+
+const OutsideTexts& Outside() {
+    static const OutsideTexts texts;
+    return texts;
+}
+
 }  // namespace TarnBench
 
 int main(int argc, char** argv) {

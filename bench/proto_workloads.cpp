@@ -96,10 +96,12 @@ void BM_build_tree_arena(benchmark::State& state) {
     allocations.Report(1.0, n);
 }
 
+// Both copies follow a read-only walk of the source, as ours do.
 void BM_deep_copy_heap(benchmark::State& state) {
     const int n = static_cast<int>(state.range(0));
     pb::VmState source;
     FillVmState(&source, n);
+    if (!CheckTree(state, source, n)) return;
     {
         pb::VmState copy(source);
         if (!CheckTree(state, copy, n)) return;
@@ -117,6 +119,7 @@ void BM_deep_copy_arena(benchmark::State& state) {
     const int n = static_cast<int>(state.range(0));
     pb::VmState source;
     FillVmState(&source, n);
+    if (!CheckTree(state, source, n)) return;
     {
         Arena arena;
         auto* copy = Arena::CreateMessage<pb::VmState>(&arena);
@@ -147,16 +150,27 @@ void BM_size_heap(benchmark::State& state) {
 // ---- a full host and location ----
 
 void FillDatastore(pb::DatastoreState* datastore, int i) {
+    const OutsideTexts& texts = Outside();
     datastore->mutable_datastore()->set_type("Datastore");
     datastore->mutable_datastore()->set_id("datastore-" + std::to_string(i));
-    datastore->mutable_summary();
+    pb::DatastoreSummary* summary = datastore->mutable_summary();
+    summary->set_name(texts.storeNames[i]);
+    summary->set_url(texts.storeUrls[i]);
+    summary->set_capacity(4LL << 40);
+    summary->set_free_space((1LL << 40) + i);
+    summary->set_accessible(true);
     datastore->mutable_capability();
 }
 
 void FillHost(pb::HostState* host) {
+    const OutsideTexts& texts = Outside();
     host->mutable_host()->set_type("HostSystem");
     host->mutable_host()->set_id("host-12");
-    host->mutable_product();
+    pb::AboutInfo* product = host->mutable_product();
+    product->set_name(kProductName);
+    product->set_full_name(kProductFullName);
+    product->set_version(kProductVersion);
+    product->set_build(kProductBuild);
     host->set_uuid(kHostUuid);
     host->set_management_ip(kHostIp);
     host->mutable_cnx_spec();
@@ -167,12 +181,20 @@ void FillHost(pb::HostState* host) {
     FillDatastore(host->mutable_local_swap_datastore(), 99);
     host->set_local_swap_datastore_writable(true);
     host->mutable_config_option();
-    host->add_mount_info();
-    host->add_mount_info();
+    for (int i = 0; i < kMounts; ++i) {
+        pb::MountInfo* mount = host->add_mount_info();
+        mount->set_path(texts.mountPaths[i]);
+        mount->set_access_mode(kAccessMode);
+        mount->set_mounted(true);
+    }
     host->mutable_v_nic_info();
     host->mutable_network();
-    host->add_option_def();
-    host->add_option_def();
+    for (int i = 0; i < kOptions; ++i) {
+        pb::OptionDef* option = host->add_option_def();
+        option->set_key(texts.optionKeys[i]);
+        option->set_label(texts.optionLabels[i]);
+        option->set_summary(kOptionSummary);
+    }
     host->mutable_prov_policy();
 }
 
@@ -216,11 +238,14 @@ void BM_record_get_set(benchmark::State& state) {
         for (int k = 0; k < 4; ++k) {
             text = reflection->GetString(host, strings[k]);
             benchmark::DoNotOptimize(text.data());
-            reflection->SetString(&host, strings[k], *values[k]);
+            std::string value(*values[k]);
+            reflection->SetString(&host, strings[k], std::move(value));
         }
-        bool flag = reflection->GetBool(host, writable);
-        benchmark::DoNotOptimize(flag);
-        reflection->SetBool(&host, writable, flag);
+        if (reflection->HasField(host, writable)) {
+            bool flag = reflection->GetBool(host, writable);
+            benchmark::DoNotOptimize(flag);
+            reflection->SetBool(&host, writable, flag);
+        }
         const google::protobuf::Message& held = reflection->GetMessage(host, product);
         benchmark::DoNotOptimize(&held);
     }
@@ -232,7 +257,11 @@ void BM_location_copy_heap(benchmark::State& state) {
     FillLocation(&source);
     {
         pb::VmLocation copy(source);
-        if (copy.datastore_size() != kDatastores || copy.host().ssl_thumbprint() != kHostThumbprint)
+        if (copy.datastore_size() != kDatastores || copy.host().ssl_thumbprint() != kHostThumbprint ||
+            copy.host().mount_info_size() != kMounts ||
+            copy.host().mount_info(kMounts - 1).path() != Outside().mountPaths[kMounts - 1] ||
+            copy.host().option_def_size() != kOptions || copy.host().product().full_name() != kProductFullName ||
+            copy.datastore(3).summary().url() != Outside().storeUrls[3])
             return Fail(state, "location copy is not a full copy");
     }
     AllocationCount allocations(state);
@@ -263,10 +292,12 @@ void BM_enum_by_tag(benchmark::State& state) {
     AllocationCount allocations(state);
     for (auto _ : state) {
         int sum = 0;
-        for (const std::string& tag : kLockTags) sum += type->FindValueByName(tag)->number();
-        if (type->FindValueByName(kUnknownTag) == nullptr) sum -= 1;
+        for (const std::string& tag : kLockTags) {
+            const google::protobuf::EnumValueDescriptor* value = type->FindValueByName(tag);
+            sum += value != nullptr ? value->number() : -1;
+        }
         benchmark::DoNotOptimize(sum);
-        if (sum != 5) return Fail(state, "wrong enumeration values");
+        if (sum != kLockValueSum) return Fail(state, "wrong enumeration values");
     }
     allocations.Report();
 }
@@ -276,9 +307,11 @@ void BM_enum_by_value(benchmark::State& state) {
     AllocationCount allocations(state);
     for (auto _ : state) {
         std::size_t length = 0;
-        for (int value = 0; value < 4; ++value) length += type->FindValueByNumber(value)->name().size();
+        for (int number : kLockValues)
+            if (const google::protobuf::EnumValueDescriptor* value = type->FindValueByNumber(number))
+                length += value->name().size();
         benchmark::DoNotOptimize(length);
-        if (length != 10) return Fail(state, "wrong enumeration tags");
+        if (length != kLockTagLength) return Fail(state, "wrong enumeration tags");
     }
     allocations.Report();
 }

@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <functional>
+#include <limits>
 #include <vector>
 
 #include "fixtures.h"
@@ -231,6 +232,33 @@ TEST(EnumTypeTest, ArraysConvertItemByItemOrNotAtAll) {
     Ref<Any> created;
     type->CreateArrayInstance(created);
     EXPECT_EQ(created->_GetType(), Orbit::GetType<Color>()->GetArrayType());
+}
+
+// The non-throwing look-ups agree with the throwing ones, on few tags (scanned) and
+// on many (hashed), for every tag, for near misses and for values out of range.
+TEST(EnumTypeTest, FindValueAndFindTagAnswerWithoutThrowing) {
+    const Orbit::EnumType* shade = Kernite::NarrowToType<Orbit::EnumType, Orbit::Type>(Orbit::GetType<Fix::Shade>());
+    for (const Orbit::EnumType* type : {static_cast<const Orbit::EnumType*>(ColorType()), shade}) {
+        std::vector<std::string> tags;
+        type->GetEnumTags(tags);
+        const int count = static_cast<int>(tags.size());
+        for (int value = 0; value < count; ++value) {
+            EXPECT_EQ(type->FindValue(tags[value]), value) << tags[value];
+            ASSERT_NE(type->FindTag(value), nullptr);
+            EXPECT_EQ(type->FindTag(value), &type->GetTag(value));
+            std::string longer = tags[value] + "x";
+            std::string upper = tags[value];
+            upper[0] = static_cast<char>(upper[0] - 'a' + 'A');
+            for (const std::string& miss : {longer, upper, tags[value].substr(1)}) {
+                EXPECT_EQ(type->FindValue(miss), -1) << miss;
+                EXPECT_FALSE(type->HasValue(miss)) << miss;
+            }
+        }
+        for (int value : {-1, count, count + 1, std::numeric_limits<int>::min(), std::numeric_limits<int>::max()})
+            EXPECT_EQ(type->FindTag(value), nullptr) << value;
+        EXPECT_EQ(type->FindValue(""), -1);
+        EXPECT_EQ(type->FindValue(std::string_view("red\0", 4)), -1);
+    }
 }
 
 }  // namespace

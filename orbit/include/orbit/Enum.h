@@ -1,8 +1,10 @@
 // Enumeration types: tags and their values (a tag's position in the tag table).
 #pragma once
 
+#include <boost/functional/hash.hpp>
 #include <boost/unordered_map.hpp>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "kernite/Exception.h"
@@ -27,6 +29,35 @@ public:
     virtual void EnumArrayToStringArray(Any* values, Kernite::Ref<Array<std::string>>& out) const = 0;
     virtual void StringArrayToEnumArray(Array<std::string>* tags, Kernite::Ref<Any>& out) const = 0;
     virtual void CreateArrayInstance(Kernite::Ref<Any>& out) const = 0;
+
+    // The non-throwing look-ups, for callers that expect unknown input (a decoder
+    // reading someone else's text): -1 for a tag that is not one, null for a value
+    // outside 0 .. tags-1. Neither is virtual nor allocates: a value is an index,
+    // and a few tags are compared faster than one is hashed.
+    int FindValue(std::string_view tag) const noexcept {
+        if (_tagCount > kScannedTags) return FindHashed(tag);
+        for (int i = 0; i < _tagCount; ++i)
+            if (_tagList[i] == tag) return i;
+        return -1;
+    }
+    const std::string* FindTag(int value) const noexcept {
+        return static_cast<unsigned>(value) < static_cast<unsigned>(_tagCount) ? &_tagList[value] : nullptr;
+    }
+
+protected:
+    static constexpr int kScannedTags = 8;
+    // Called once by the implementation's constructor: `tags` in value order, kept
+    // alive by the implementation for the type's life.
+    void SetTagList(const std::string* tags, int count) noexcept {
+        _tagList = tags;
+        _tagCount = count;
+    }
+    // Beyond kScannedTags: the implementation's hash map, without making a string.
+    virtual int FindHashed(std::string_view tag) const noexcept = 0;
+
+private:
+    const std::string* _tagList = nullptr;
+    int _tagCount = 0;
 };
 
 // Built once from the enumeration's record; read-only afterwards, so any thread may
@@ -40,6 +71,7 @@ public:
             _values[tag] = i;
             _tags.push_back(std::move(tag));
         }
+        SetTagList(_tags.data(), static_cast<int>(_tags.size()));
     }
 
     void GetEnumTags(std::vector<std::string>& out) const override { out = _tags; }
@@ -80,6 +112,14 @@ public:
         out = std::move(values);
     }
     void CreateArrayInstance(Kernite::Ref<Any>& out) const override { out = new Array<E>(); }
+
+protected:
+    int FindHashed(std::string_view tag) const noexcept override {
+        // boost::hash of a string is hash_range over its characters, so a view hashes alike.
+        auto it = _values.find(tag, [](std::string_view t) { return boost::hash_range(t.begin(), t.end()); },
+                               [](std::string_view a, const std::string& b) { return a == b; });
+        return it == _values.end() ? -1 : it->second;
+    }
 
 private:
     boost::unordered_map<std::string, int> _values;
