@@ -4,6 +4,7 @@
 set -euo pipefail
 packages=(g++ cmake ninja-build libboost-dev libgtest-dev libgmock-dev libbenchmark-dev
           nlohmann-json3-dev  # the tests read tarn-catalog's JSON with it
+          libmimalloc-dev  # the allocator of Kernite's objects (kernite/Memory.h)
           libprotobuf-dev protobuf-compiler  # the benchmarks' side-by-side twin
           libpugixml-dev python3-zeep  # the wire's XML parser; the SOAP client that reads its WSDL
           libssl-dev openssl  # TLS of the HTTP transport; the tests make their certificates with openssl

@@ -8,6 +8,7 @@
 #include <new>
 
 #include "kernite/Assert.h"
+#include "kernite/Memory.h"
 
 namespace Kernite {
 namespace {
@@ -79,13 +80,21 @@ void CountLive(long delta) noexcept {
 
 }  // namespace
 
-ObjectImpl::ObjectImpl() noexcept { CountLive(1); }
+std::atomic<bool> ObjectImpl::sCountingLive{false};
 
-ObjectImpl::ObjectImpl(const ObjectImpl&) noexcept : Object() { CountLive(1); }
+void ObjectImpl::CountMade() noexcept {
+    _counted = true;
+    CountLive(1);
+}
 
-ObjectImpl::~ObjectImpl() { CountLive(-1); }
+void ObjectImpl::CountEnded() noexcept { CountLive(-1); }
+
+void* ObjectImpl::operator new(std::size_t size) { return Memory::Allocate(size); }
+
+void ObjectImpl::operator delete(void* p) noexcept { Memory::Free(p); }
 
 long ObjectImpl::LiveObjects() noexcept {
+    sCountingLive.store(true, std::memory_order_relaxed);
     long live = gUncounted.load(std::memory_order_relaxed);
     for (LiveCounter* c = gCounters.load(std::memory_order_acquire); c != nullptr; c = c->next)
         live += c->count.load(std::memory_order_relaxed);

@@ -1,3 +1,4 @@
+#include <algorithm>
 #include <atomic>
 #include <cstdint>
 #include <functional>
@@ -8,6 +9,7 @@
 #include <unordered_set>
 
 #include "kernite/Assert.h"
+#include "kernite/Memory.h"
 #include "orbit/Any.h"
 #include "orbit/Array.h"
 #include "orbit/DataObject.h"
@@ -138,43 +140,93 @@ void DataArrayBase::_DiffProperties(Any* other, const std::string& path, Propert
 }
 
 DataObjectArrayBase::DataObjectArrayBase(const DataObjectArrayBase& other) : DataArrayBase() {
-    _vec.reserve(other._vec.size());
-    for (const auto& item : other._vec) {
-        Any* clone = item ? item->_Clone() : nullptr;
-        if (clone) clone->IncRefNew();
-        _vec.push_back(Kernite::Ref<Any>::Adopt(clone));  // room was reserved: cannot throw
+    if (other._size > kInlineItems) {
+        _items = static_cast<Any**>(Kernite::Memory::Allocate(sizeof(Any*) * other._size));
+        _capacity = other._size;
+    }
+    // Cloned one by one, so that a failing clone leaves a consistent array for the
+    // destructor to release.
+    try {
+        for (int i = 0; i < other._size; ++i) {
+            Any* clone = other._items[i] ? other._items[i]->_Clone() : nullptr;
+            if (clone) clone->IncRefNew();
+            _items[_size++] = clone;
+        }
+    } catch (...) {
+        Clear();
+        if (_items != _inline) Kernite::Memory::Free(_items);
+        throw;
     }
 }
 
+DataObjectArrayBase::~DataObjectArrayBase() {
+    Clear();
+    if (_items != _inline) Kernite::Memory::Free(_items);
+}
+
+void DataObjectArrayBase::Clear() {
+    // Items are released last to first, and each after it left the array, so that a
+    // release that reaches back into this array sees it consistent.
+    while (_size > 0) {
+        Any* item = _items[--_size];
+        if (item) item->DecRef();
+    }
+}
+
+void DataObjectArrayBase::Grow(int capacity) {
+    if (capacity <= _capacity) return;
+    const int grown = std::max(capacity, _capacity * 2);
+    auto** items = static_cast<Any**>(Kernite::Memory::Allocate(sizeof(Any*) * static_cast<std::size_t>(grown)));
+    std::copy(_items, _items + _size, items);
+    if (_items != _inline) Kernite::Memory::Free(_items);
+    _items = items;
+    _capacity = grown;
+}
+
 void DataObjectArrayBase::RemoveAt(int index) {
-    if (!(0 <= index && index < (int)_vec.size()))
-        Kernite::PanicAssert("0 <= index && index < (int)_vec.size()", "orbit/array", __LINE__);
-    _vec.erase(_vec.begin() + index);
+    CheckIndex(index);
+    Any* removed = _items[index];
+    std::copy(_items + index + 1, _items + _size, _items + index);
+    --_size;
+    if (removed) removed->DecRef();
 }
 
 void DataObjectArrayBase::Reserve(int capacity) {
     if (capacity < 0) Kernite::PanicAssert("capacity >= 0", "orbit/array", __LINE__);
-    _vec.reserve(static_cast<std::size_t>(capacity));
+    if (capacity > _capacity) {
+        auto** items = static_cast<Any**>(Kernite::Memory::Allocate(sizeof(Any*) * static_cast<std::size_t>(capacity)));
+        std::copy(_items, _items + _size, items);
+        if (_items != _inline) Kernite::Memory::Free(_items);
+        _items = items;
+        _capacity = capacity;
+    }
 }
 
+// The inline items are part of the object; a separate block counts on its own.
 unsigned int DataObjectArrayBase::_GetSize(SizeFunction f) const {
     unsigned int size = sizeof(DataObjectArrayBase);
-    size += f(static_cast<unsigned int>(_vec.capacity() * sizeof(Kernite::Ref<Any>)));
-    for (const auto& item : _vec)
-        if (item) size += item->_GetSize(f);
+    if (_items != _inline) size += f(static_cast<unsigned int>(sizeof(Any*) * static_cast<std::size_t>(_capacity)));
+    for (int i = 0; i < _size; ++i)
+        if (_items[i]) size += _items[i]->_GetSize(f);
     return size;
 }
 
 void DataObjectArrayBase::SetAtInt(int index, Any* item) {
-    if (!(0 <= index && index < (int)_vec.size()))
-        Kernite::PanicAssert("0 <= index && index < (int)_vec.size()", "orbit/array", __LINE__);
-    _vec[index] = item;
+    CheckIndex(index);
+    if (item) item->IncRef();
+    Any* old = _items[index];
+    _items[index] = item;
+    if (old) old->DecRef();
 }
 
 void DataObjectArrayBase::InsertAtInt(int index, Any* item) {
-    if (!(0 <= index && index <= (int)_vec.size()))
+    if (!(0 <= index && index <= _size))
         Kernite::PanicAssert("0 <= index && index <= (int)_vec.size()", "orbit/array", __LINE__);
-    _vec.emplace(_vec.begin() + index, item);
+    if (_size == _capacity) Grow(_size + 1);
+    std::copy_backward(_items + index, _items + _size, _items + _size + 1);
+    if (item) item->IncRef();
+    _items[index] = item;
+    ++_size;
 }
 
 }  // namespace Orbit

@@ -90,6 +90,49 @@ void CopyAndClone(const char* name, std::uint32_t seed) {
         [&] { return Same(source.Get(), before.Get()); });
 }
 
+// Every object is a failure point wherever its memory comes from (the global
+// operator new, or Kernite's own allocator through its failure probe), and an
+// object array keeps its first items inside itself.
+TEST(AllocationFailure, EachObjectAndEachItemBlockIsOneAllocation) {
+    using Item = Cairn::Vm::ConfigInfo;
+    constexpr int kInline = Orbit::DataObjectArrayBase::kInlineItems;
+    Ref<Item> item(new Item());
+    const struct {
+        const char* what;
+        int items;
+        long allocations;
+    } cases[] = {{"an empty record", -1, 1}, {"an empty array", 0, 1}, {"an array of inline items", kInline, 1},
+                 {"an array with an item block", kInline + 1, 2}};
+    auto make = [&](int items) {
+        if (items < 0) {
+            Ref<Item> made(new Item());
+            return;
+        }
+        Ref<Orbit::DataArray<Item>> array(new Orbit::DataArray<Item>());
+        for (int i = 0; i < items; ++i) array->Append(item.Get());
+    };
+    for (const auto& c : cases) {
+        long counted = 0;
+        {
+            Armed counting(0);
+            make(c.items);
+            counted = DisarmAllocator();
+        }
+        EXPECT_EQ(counted, c.allocations) << c.what;
+        const long live = LiveObjects();
+        bool threw = false;
+        try {
+            Armed failing(c.allocations);  // the last one
+            make(c.items);
+        } catch (const std::bad_alloc&) {
+            threw = true;
+        }
+        EXPECT_TRUE(threw) << c.what;
+        EXPECT_EQ(LiveObjects(), live) << c.what;
+    }
+    EXPECT_EQ(item->GetRefCount(), 1);
+}
+
 TEST(AllocationFailure, CopiesAndClonesOfPopulatedObjects) {
     CopyAndClone<Tarn::Vmprov::VmState>("VmState", 11);
     CopyAndClone<Tarn::Vmprov::HostState>("HostState", 12);

@@ -3,6 +3,8 @@
 #include <cstdlib>
 #include <new>
 
+#include "kernite/Memory.h"
+
 namespace Reliability {
 namespace {
 
@@ -11,10 +13,19 @@ thread_local bool tArmed = false;
 thread_local long tCount = 0;
 thread_local long tFailAt = 0;
 
+bool Granted() noexcept { return !(tArmed && ++tCount == tFailAt); }
+
 void* Allocate(std::size_t size) {
-    if (tArmed && ++tCount == tFailAt) return nullptr;
+    if (!Granted()) return nullptr;
     return std::malloc(size == 0 ? 1 : size);
 }
+
+// Objects that take their memory from Kernite's own allocator rather than from the
+// global operator new are counted and failed alike.
+const bool gProbeSet = [] {
+    Kernite::Memory::SetFailureProbe(&Granted);
+    return true;
+}();
 
 }  // namespace
 

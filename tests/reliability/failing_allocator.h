@@ -1,6 +1,7 @@
 // The test binary's global operator new/delete, which can be told to fail the k-th
-// allocation of the current thread from now on. Exceptions themselves are
-// allocated by the language runtime with malloc and are not affected.
+// allocation of the current thread from now on; it also answers Kernite's failure
+// probe, so objects fail alike wherever their memory comes from. Exceptions
+// themselves are allocated by the language runtime with malloc and are not affected.
 #pragma once
 
 namespace Reliability {

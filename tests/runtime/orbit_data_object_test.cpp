@@ -209,6 +209,34 @@ TEST_F(DataObjectTest, ConstructorsAndCopiesShareNothing) {
     EXPECT_EQ(circle->GetChildren(), full->GetChildren());
 }
 
+// Reading an array through a const object installs an empty one; copies made
+// afterwards leave it out, so they make no more objects than before the read and
+// measure that array less than their source, and the copy's own read yields
+// another empty array.
+TEST_F(DataObjectTest, ArraysMadeByReadsAreNotCopied) {
+    Ref<Shape> leaf = Labelled("leaf");
+    Ref<Shape> root = Labelled("root");
+    root->SetChildren(Make<DataArray<Shape>>(std::initializer_list<Shape*>{leaf.Get()}).Get());
+    auto objectsMadeByACopy = [&] {
+        const long before = Kernite::ObjectImpl::LiveObjects();
+        Ref<Shape> copy = Make<Shape>(*root);
+        return Kernite::ObjectImpl::LiveObjects() - before;
+    };
+    const long unread = objectsMadeByACopy();
+    const unsigned int unreadSize = root->_GetSize(Exact);
+    const Shape* readOnly = leaf.Get();
+    DataArray<Shape>* created = readOnly->GetChildren();
+    ASSERT_TRUE(created->IsEmpty());
+    EXPECT_EQ(objectsMadeByACopy(), unread);
+
+    Ref<Shape> copy = Make<Shape>(*root);
+    EXPECT_EQ(root->_GetSize(Exact), unreadSize + created->_GetSize(Exact));
+    EXPECT_EQ(copy->_GetSize(Exact), unreadSize);
+    DataArray<Shape>* copied = copy->GetChildren()->GetAt(0)->GetChildren();
+    EXPECT_TRUE(copied->IsEmpty());
+    EXPECT_NE(copied, created);
+}
+
 TEST_F(DataObjectTest, SizeIsTheObjectOnceAndWhatItsMembersHold) {
     for (Orbit::SizeFunction f : {&Exact, &Rounded}) {
         Ref<Shape> shape = Make<Shape>();

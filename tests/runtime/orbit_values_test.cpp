@@ -2,6 +2,7 @@
 // dispatch helpers.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <functional>
 #include <limits>
 #include <vector>
@@ -105,6 +106,58 @@ TEST_F(ValuesTest, ObjectArraysInsertSetAndCopyDeeply) {
     EXPECT_EQ(shapes->_GetDataItemType(), Orbit::GetDoType<Shape>());
 }
 
+// Object arrays keep their first items inside the array object and the rest in a
+// block of their own: every operation must agree with a plain vector on both sides
+// of that boundary, hold exactly one reference per item, and measure the block only
+// when there is one.
+TEST_F(ValuesTest, ObjectArraysBehaveAlikeInsideAndBeyondTheirInlineItems) {
+    constexpr int kInline = Orbit::DataObjectArrayBase::kInlineItems;
+    std::vector<Ref<Shape>> shapes;
+    for (int i = 0; i < 2 * kInline + 2; ++i) shapes.push_back(Labelled("s" + std::to_string(i)));
+    for (int length = 0; length <= 2 * kInline + 1; ++length) {
+        SCOPED_TRACE("length " + std::to_string(length));
+        Ref<DataArray<Shape>> array(new DataArray<Shape>());
+        std::vector<Shape*> model;
+        for (int i = 0; i < length; ++i) {
+            // Appends, inserts at the front and in the middle, and a null item, in turn.
+            Shape* item = i % 5 == 4 ? nullptr : shapes[i].Get();  // each shape at most once
+            const int at = i % 3 == 0 ? array->GetLength() : i % 3 == 1 ? 0 : array->GetLength() / 2;
+            array->InsertAt(at, item);
+            model.insert(model.begin() + at, item);
+        }
+        auto agree = [&](const DataArray<Shape>& a) {
+            ASSERT_EQ(a.GetLength(), static_cast<int>(model.size()));
+            for (int i = 0; i < a.GetLength(); ++i) EXPECT_EQ(a.GetAt(i), model[i]) << i;
+        };
+        agree(*array);
+        for (int i = 0; i < length; ++i)
+            EXPECT_EQ(shapes[i]->GetRefCount(), 1 + std::count(model.begin(), model.end(), shapes[i].Get()));
+
+        // A copy has room for exactly its items.
+        Ref<DataArray<Shape>> copy(static_cast<DataArray<Shape>*>(array->_Clone()));
+        unsigned int held = 0;
+        for (int i = 0; i < copy->GetLength(); ++i) {
+            if (model[i] == nullptr) {
+                EXPECT_EQ(copy->GetAt(i), nullptr);
+                continue;
+            }
+            EXPECT_NE(copy->GetAt(i), model[i]);
+            EXPECT_TRUE(copy->GetAt(i)->_IsEqual(model[i]));
+            held += copy->GetAt(i)->_GetSize(Exact);
+        }
+        const unsigned int block = length > kInline ? length * sizeof(Any*) : 0;
+        EXPECT_EQ(copy->_GetSize(Exact), sizeof(Orbit::DataObjectArrayBase) + block + held);
+
+        while (!model.empty()) {
+            const int at = static_cast<int>(model.size()) / 2;
+            array->RemoveAt(at);
+            model.erase(model.begin() + at);
+            agree(*array);
+        }
+        for (const Ref<Shape>& shape : shapes) EXPECT_EQ(shape->GetRefCount(), 1);
+    }
+}
+
 using ValuesDeathTest = ValuesTest;
 
 TEST_F(ValuesDeathTest, CheckedOperationsGuardIndexAndClass) {
@@ -142,6 +195,13 @@ TEST_F(ValuesTest, ArrayFieldsInstallOnceAndClearInPlace) {
     EXPECT_EQ(copy.Peek()->GetItems(), installed->GetItems());
     field.Reset();
     EXPECT_TRUE(field.Peek()->IsEmpty());
+
+    // An installed empty array is not cloned: the copy's field stays empty.
+    const long live = Kernite::ObjectImpl::LiveObjects();
+    Orbit::ArrayField<Array<std::string>> emptyCopy(field);
+    EXPECT_EQ(emptyCopy.Peek(), nullptr);
+    EXPECT_EQ(Kernite::ObjectImpl::LiveObjects(), live);
+    EXPECT_NE(emptyCopy.Get(), field.Peek());
 }
 
 TEST_F(ValuesTest, ManagedObjectReferencesCompareByTypeAndId) {

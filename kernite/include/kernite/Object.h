@@ -7,6 +7,7 @@
 #pragma once
 
 #include <atomic>
+#include <cstddef>
 #include <string>
 #include <typeinfo>
 
@@ -51,16 +52,29 @@ public:
     std::string ToString() const override;
     int GetRefCount() const override;
 
-    // Number of ObjectImpl instances alive in the process; tests use it to prove
-    // that nothing leaks.
+    // Number of ObjectImpl instances made since counting began and still alive;
+    // tests use it to prove that nothing leaks. Counting begins with the first call,
+    // so a process that never asks pays a load and a branch per object for it, and
+    // objects made before that call are not counted, not even when they end: ask
+    // once before what is measured, then compare.
     static long LiveObjects() noexcept;
 
+    // Objects take their memory from Kernite::Memory (kernite/Memory.h).
+    static void* operator new(std::size_t size);
+    static void operator delete(void* p) noexcept;
+
 protected:
-    ObjectImpl() noexcept;
+    ObjectImpl() noexcept {
+        if (sCountingLive.load(std::memory_order_relaxed)) CountMade();
+    }
     // A copy is a new object: it starts unreferenced whatever the source's count.
-    ObjectImpl(const ObjectImpl&) noexcept;
+    ObjectImpl(const ObjectImpl&) noexcept : Object() {
+        if (sCountingLive.load(std::memory_order_relaxed)) CountMade();
+    }
     ObjectImpl& operator=(const ObjectImpl&) = delete;
-    ~ObjectImpl() override;
+    ~ObjectImpl() override {
+        if (_counted) CountEnded();
+    }
 
     // Hooks on the first reference taken and on the last released (just before
     // deletion); the default does nothing.
@@ -71,8 +85,14 @@ private:
     // Runs the last-release hook and deletes the object.
     void Destroy() const;
     [[noreturn]] static void ReleasedTooOften();
+    void CountMade() noexcept;
+    void CountEnded() noexcept;
+
+    static std::atomic<bool> sCountingLive;
 
     mutable std::atomic<int> _refCount{0};
+    // Whether this object is in the live count (it was made while counting).
+    bool _counted = false;
 };
 
 } // namespace Kernite

@@ -37,8 +37,8 @@ public:
     }
     void Append(const T& item) { _vec.push_back(item); }
 
-    bool IsEmpty() const override { return _vec.empty(); }
-    int GetLength() const override { return static_cast<int>(_vec.size()); }
+    bool IsEmpty() const final { return _vec.empty(); }
+    int GetLength() const final { return static_cast<int>(_vec.size()); }
     void Clear() override { _vec.clear(); }
 
     Type* _GetType() const override { return GetType<T>()->GetArrayType(); }
@@ -80,21 +80,27 @@ protected:
     virtual const std::type_info& ArrayClass() const = 0;
 };
 
+// Items are held by reference, possibly null. The first kInlineItems live inside
+// the array object, so a small array is one allocation; four make the object 64
+// bytes, one cache line. Larger arrays keep their items in a separate block.
 class DataObjectArrayBase : public DataArrayBase {
 public:
-    DataObjectArrayBase() = default;
+    static constexpr int kInlineItems = 4;
+
+    DataObjectArrayBase() noexcept = default;
     // A copy clones every item (null stays null), so copies share nothing.
     DataObjectArrayBase(const DataObjectArrayBase& other);
+    DataObjectArrayBase& operator=(const DataObjectArrayBase&) = delete;
+    ~DataObjectArrayBase() override;
 
-    bool IsEmpty() const override { return _vec.empty(); }
-    int GetLength() const override { return static_cast<int>(_vec.size()); }
-    void Clear() override { _vec.clear(); }
+    bool IsEmpty() const final { return _size == 0; }
+    int GetLength() const final { return _size; }
+    void Clear() override;
     // The item at `index`, possibly null, without taking a reference: for readers that
     // do not know the item class.
     Any* GetItem(int index) const {
-        if (!(0 <= index && index < (int)_vec.size()))
-            Kernite::PanicAssert("0 <= index && index < (int)_vec.size()", "orbit/array", __LINE__);
-        return _vec[index].Get();
+        CheckIndex(index);
+        return _items[index];
     }
     void RemoveAt(int index);
     void Reserve(int capacity);
@@ -110,10 +116,25 @@ protected:
     // Unchecked as to class: the typed entry points of DataArray<T> check first.
     void SetAtInt(int index, Any* item);
     void InsertAtInt(int index, Any* item);
-    void AppendInt(Any* item) { _vec.emplace_back(item); }
-    Any* ItemAt(int index) const override { return _vec[index].Get(); }
+    void AppendInt(Any* item) {
+        if (_size == _capacity) Grow(_size + 1);
+        if (item) item->IncRef();
+        _items[_size++] = item;
+    }
+    Any* ItemAt(int index) const override { return _items[index]; }
+    void CheckIndex(int index) const {
+        if (!(0 <= index && index < _size))
+            Kernite::PanicAssert("0 <= index && index < (int)_vec.size()", "orbit/array", __LINE__);
+    }
 
-    std::vector<Kernite::Ref<Any>> _vec;
+private:
+    // Room for at least `capacity` items, growing geometrically.
+    void Grow(int capacity);
+
+    Any** _items = _inline;  // each non-null item holds one reference
+    int _size = 0;
+    int _capacity = kInlineItems;
+    Any* _inline[kInlineItems];
 };
 
 // Items are T (a data object class, a fault, Orbit::Any or Orbit::MoRef), or null.
@@ -122,15 +143,14 @@ class DataArray : public DataObjectArrayBase {
 public:
     DataArray() = default;
     DataArray(std::initializer_list<T*> items) {
-        _vec.reserve(items.size());
+        Reserve(static_cast<int>(items.size()));
         for (T* item : items) AppendInt(item);
     }
     DataArray(const DataArray& other) : DataObjectArrayBase(other) {}
 
     T* GetAt(int index) const {
-        if (!(0 <= index && index < (int)_vec.size()))
-            Kernite::PanicAssert("0 <= index && index < (int)_vec.size()", "orbit/array", __LINE__);
-        return static_cast<T*>(_vec[index].Get());
+        CheckIndex(index);
+        return static_cast<T*>(ItemAt(index));
     }
     // Typed entry points: the class is known, so no check is needed.
     void Append(T* item) { AppendInt(item); }
@@ -139,13 +159,12 @@ public:
 
     // A non-null item must be a T.
     void CheckedSetAt(int index, Any* item) override {
-        if (!(0 <= index && index < (int)_vec.size()))
-            Kernite::PanicAssert("0 <= index && index < (int)_vec.size()", "orbit/array", __LINE__);
+        CheckIndex(index);
         SetAtInt(index, Checked(item));
     }
     void CheckedAppend(Any* item) override { AppendInt(Checked(item)); }
     void CheckedInsertAt(int index, Any* item) override {
-        if (!(0 <= index && index <= (int)_vec.size()))
+        if (!(0 <= index && index <= GetLength()))
             Kernite::PanicAssert("0 <= index && index <= (int)_vec.size()", "orbit/array", __LINE__);
         InsertAtInt(index, Checked(item));
     }
@@ -179,9 +198,11 @@ public:
     explicit ArrayField(A* array) noexcept : _array(array) {
         if (array) array->IncRef();
     }
-    // Deep: the other field's array is cloned.
+    // Deep: the other field's array is cloned. An empty array is not: the copy's
+    // field stays empty and makes its own array when first read, so an array that a
+    // read created costs later copies nothing.
     ArrayField(const ArrayField& other) {
-        if (A* source = other.Peek()) {
+        if (A* source = other.Peek(); source != nullptr && !source->IsEmpty()) {
             A* copy = static_cast<A*>(source->_Clone());
             copy->IncRefNew();
             _array.store(copy, std::memory_order_relaxed);
