@@ -41,25 +41,63 @@ std::vector<Version*> Version::GetIncluded() const {
 VersionMap::VersionMap() = default;
 VersionMap::~VersionMap() = default;
 
+// A repeat changes nothing (the first declaration stands), so recognising one is
+// enough to return.
+bool VersionMap::Repeats(const std::string& version, const std::string* included) const noexcept {
+    struct Cursor {
+        const VersionMap* map = nullptr;
+        std::size_t next = 0;
+    };
+    thread_local Cursor cursor;
+    if (cursor.map != this) cursor = Cursor{this, 0};
+    const std::size_t count = _declaredCount.load(std::memory_order_acquire);
+    // Where this thread's last match left off, or the start of another pass.
+    for (std::size_t at : {cursor.next, std::size_t{0}}) {
+        if (at >= count) continue;
+        const Declaration& d = _declared[at / kChunk][at % kChunk];
+        if ((d.included == nullptr) != (included == nullptr) || d.version->GetName() != version ||
+            (included != nullptr && d.included->GetName() != *included))
+            continue;
+        cursor.next = at + 1;
+        return true;
+    }
+    return false;
+}
+
+void VersionMap::Remember(const Version* version, const Version* included) {
+    std::lock_guard<std::mutex> lock(_declaredMutex);
+    const std::size_t at = _declaredCount.load(std::memory_order_relaxed);
+    if (at >= kChunk * kChunks) return;
+    if (!_declared[at / kChunk]) _declared[at / kChunk] = std::make_unique<Declaration[]>(kChunk);
+    _declared[at / kChunk][at % kChunk] = Declaration{version, included};
+    _declaredCount.store(at + 1, std::memory_order_release);
+}
+
 void VersionMap::AddVersion(const std::string& name, const std::string& serviceNamespace,
                             const std::string& versionId, std::uint32_t flags, const std::string& taskType,
                             std::uint32_t /*flags2*/, const std::string& /*reserved*/) {
     _addVersionCalls.fetch_add(1, std::memory_order_relaxed);
+    if (Repeats(name, nullptr)) return;
     std::unique_lock<std::shared_mutex> lock(_mutex);
     if (_byName.count(name) != 0) return;  // the first declaration stands
     Version& version = _versions.emplace_back(name, serviceNamespace, versionId, flags, taskType);
     _byName.emplace(name, &version);
+    Remember(&version, nullptr);
 }
 
 void VersionMap::AddIncludedVersion(const std::string& version, const std::string& included) {
     _addIncludedVersionCalls.fetch_add(1, std::memory_order_relaxed);
+    if (Repeats(version, &included)) return;
     std::shared_lock<std::shared_mutex> lock(_mutex);
     auto from = _byName.find(version);
     if (from == _byName.end()) throw Kernite::InvalidArgumentException(version);
     auto to = _byName.find(included);
     if (to == _byName.end()) throw Kernite::InvalidArgumentException(included);
     std::unique_lock<std::shared_mutex> inclusions(InclusionMutex());
-    if (from->second->_includedSet.insert(to->second).second) from->second->_included.push_back(to->second);
+    if (from->second->_includedSet.insert(to->second).second) {
+        from->second->_included.push_back(to->second);
+        Remember(from->second, to->second);
+    }
 }
 
 Version* VersionMap::GetVersion(const std::string& name) const {

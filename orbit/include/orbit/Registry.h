@@ -6,6 +6,7 @@
 #include <cstdint>
 #include <deque>
 #include <memory>
+#include <mutex>
 #include <shared_mutex>
 #include <string>
 #include <unordered_map>
@@ -72,6 +73,24 @@ public:
     long AddIncludedVersionCalls() const noexcept { return _addIncludedVersionCalls.load(); }
 
 private:
+    // Every declaration that changed the map, in order. Each loader of a library
+    // declares the same list again; such a repeat is recognised by comparing the
+    // names with the entry after the one the calling thread matched last, without
+    // hashing or locking. Entries never move once published, so they are read
+    // without a lock up to the published count.
+    struct Declaration {
+        const Version* version;
+        const Version* included;  // null for AddVersion
+    };
+    static constexpr std::size_t kChunk = 512;
+    static constexpr std::size_t kChunks = 64;  // beyond that, declarations are not remembered
+    bool Repeats(const std::string& version, const std::string* included) const noexcept;
+    void Remember(const Version* version, const Version* included);
+
+    std::mutex _declaredMutex;
+    std::unique_ptr<Declaration[]> _declared[kChunks];
+    std::atomic<std::size_t> _declaredCount{0};
+
     mutable std::shared_mutex _mutex;
     std::deque<Version> _versions;
     std::unordered_map<std::string, Version*> _byName;
