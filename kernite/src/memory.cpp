@@ -14,13 +14,13 @@ namespace {
 
 std::atomic<FailureProbe> gProbe{nullptr};
 
-[[noreturn]] void OutOfMemory() { throw std::bad_alloc(); }
-
 }  // namespace
 
 void SetFailureProbe(FailureProbe probe) noexcept { gProbe.store(probe, std::memory_order_release); }
 
 #if defined(TARN_OBJECTS_MIMALLOC) || defined(TARN_OBJECTS_JEMALLOC)
+
+[[noreturn]] static void OutOfMemory() { throw std::bad_alloc(); }
 
 void* Allocate(std::size_t size) {
     if (FailureProbe probe = gProbe.load(std::memory_order_acquire); probe != nullptr && !probe()) OutOfMemory();
