@@ -1,54 +1,71 @@
 #include "kernite/Memory.h"
 
+#include <dlfcn.h>
+
 #include <atomic>
 #include <new>
-
-#if defined(TARN_OBJECTS_MIMALLOC)
-#include <mimalloc.h>
-#elif defined(TARN_OBJECTS_JEMALLOC)
-#include <jemalloc/jemalloc.h>
-#endif
 
 namespace Kernite::Memory {
 namespace {
 
-std::atomic<FailureProbe> gProbe{nullptr};
+std::atomic<AllocationProbe> gProbe{nullptr};
+
+#if defined(TARN_OBJECTS_LIBRARY)
+// Debian ships the allocators only as libraries that also define malloc and the
+// global operator new. Opened privately (RTLD_LOCAL) instead of linked, the library
+// never joins the process's symbol scope, so those stay the C and C++ libraries'
+// whatever order a program loads its libraries in. Should it not open, objects take
+// the global operator new.
+struct Library {
+    void* (*allocate)(std::size_t) = nullptr;
+    void (*release)(void*) = nullptr;
+    const char* name = "operator new";
+
+    Library() {
+        void* handle = dlopen(TARN_OBJECTS_LIBRARY, RTLD_NOW | RTLD_LOCAL);
+        if (handle == nullptr) return;
+        auto* a = reinterpret_cast<void* (*)(std::size_t)>(dlsym(handle, TARN_OBJECTS_ALLOCATE));
+        auto* r = reinterpret_cast<void (*)(void*)>(dlsym(handle, TARN_OBJECTS_FREE));
+        if (a == nullptr || r == nullptr) {
+            dlclose(handle);
+            return;
+        }
+        allocate = a;
+        release = r;
+        name = TARN_OBJECTS_NAME;
+    }
+};
+
+// Chosen on the first allocation; Free only ever sees memory from after that.
+const Library& Chosen() {
+    static const Library library;
+    return library;
+}
+#endif
 
 }  // namespace
 
-void SetFailureProbe(FailureProbe probe) noexcept { gProbe.store(probe, std::memory_order_release); }
+void SetAllocationProbe(AllocationProbe probe) noexcept { gProbe.store(probe, std::memory_order_release); }
 
-#if defined(TARN_OBJECTS_MIMALLOC) || defined(TARN_OBJECTS_JEMALLOC)
-
-[[noreturn]] static void OutOfMemory() { throw std::bad_alloc(); }
+#if defined(TARN_OBJECTS_LIBRARY)
 
 void* Allocate(std::size_t size) {
-    if (FailureProbe probe = gProbe.load(std::memory_order_acquire); probe != nullptr && !probe()) OutOfMemory();
-#if defined(TARN_OBJECTS_MIMALLOC)
-    void* p = mi_malloc(size);
-#else
-    void* p = mallocx(size == 0 ? 1 : size, 0);
-#endif
-    if (p == nullptr) OutOfMemory();
-    return p;
+    const Library& library = Chosen();
+    if (library.allocate == nullptr) return ::operator new(size);
+    if (AllocationProbe probe = gProbe.load(std::memory_order_acquire); probe != nullptr && !probe())
+        throw std::bad_alloc();
+    if (void* p = library.allocate(size == 0 ? 1 : size)) return p;
+    throw std::bad_alloc();
 }
 
 void Free(void* p) noexcept {
     if (p == nullptr) return;
-#if defined(TARN_OBJECTS_MIMALLOC)
-    mi_free(p);
-#else
-    dallocx(p, 0);
-#endif
+    const Library& library = Chosen();
+    if (library.release == nullptr) return ::operator delete(p);
+    library.release(p);
 }
 
-const char* AllocatorName() noexcept {
-#if defined(TARN_OBJECTS_MIMALLOC)
-    return "mimalloc";
-#else
-    return "jemalloc";
-#endif
-}
+const char* AllocatorName() noexcept { return Chosen().name; }
 
 #else
 

@@ -23,7 +23,7 @@ void* Allocate(std::size_t size) {
 // Objects that take their memory from Kernite's own allocator rather than from the
 // global operator new are counted and failed alike.
 const bool gProbeSet = [] {
-    Kernite::Memory::SetFailureProbe(&Granted);
+    Kernite::Memory::SetAllocationProbe(&Granted);
     return true;
 }();
 

@@ -3,10 +3,10 @@
 // Every Kernite object is allocated through ObjectImpl's class-level operator new,
 // which comes here, and so is the item storage of object arrays. The memory comes
 // from an allocator with deep per-thread size-class caches (mimalloc by default,
-// chosen with TARN_OBJECT_ALLOCATOR; see AllocatorName()), called through its own
-// prefixed functions and used only for these objects: the process's malloc and
-// global operator new stay as they are. Sanitizer builds take the global operator
-// new instead, so that the sanitizers see every object.
+// chosen with TARN_OBJECT_ALLOCATOR; see AllocatorName()), opened privately and
+// used only for these objects: the process's malloc and global operator new stay
+// the C and C++ libraries'. Sanitizer builds take the global operator new instead,
+// so that the sanitizers see every object.
 #pragma once
 
 #include <cstddef>
@@ -21,12 +21,12 @@ void Free(void* p) noexcept;
 // "mimalloc", "jemalloc" or "operator new": where Allocate takes its memory.
 const char* AllocatorName() noexcept;
 
-// For tests that fail allocations on purpose: when a probe is set, Allocate asks it
-// first and throws std::bad_alloc if it answers false. It is consulted only where
-// Allocate does not go through the global operator new (which such tests replace
-// themselves), so that a failing global operator new and this probe together
-// cover every allocation of an object exactly once.
-using FailureProbe = bool (*)() noexcept;
-void SetFailureProbe(FailureProbe probe) noexcept;
+// For tests and benchmarks that watch allocations: when a probe is set, Allocate
+// asks it first and throws std::bad_alloc if it answers false (a counting probe
+// answers true). It is consulted only where Allocate does not go through the
+// global operator new (which such programs replace themselves), so that their
+// operator new and this probe together see every allocation of an object exactly once.
+using AllocationProbe = bool (*)() noexcept;
+void SetAllocationProbe(AllocationProbe probe) noexcept;
 
 }  // namespace Kernite::Memory
