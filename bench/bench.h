@@ -12,7 +12,8 @@
 
 namespace TarnBench {
 
-// Every global operator new of the process, counted (see main.cpp).
+// Every global operator new of the process and every allocation of Kernite's own
+// allocator, counted (see main.cpp).
 std::uint64_t Allocations() noexcept;
 
 // Marks the run as broken: the benchmark is skipped and the binary exits non-zero,

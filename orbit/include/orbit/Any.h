@@ -32,6 +32,9 @@ class Any : public Kernite::ObjectImpl {
 public:
     virtual Type* _GetType() const = 0;
     // The memory this value holds, itself included, each allocation mapped by f.
+    // A copy of a data object measures the same as its source, less the empty
+    // arrays that reads installed in the source: the copy leaves those out (see
+    // ArrayField).
     virtual unsigned int _GetSize(SizeFunction f) const = 0;
     // A deep copy, unreferenced (the caller takes the first reference). Immutable
     // values may return themselves.

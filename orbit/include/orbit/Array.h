@@ -200,7 +200,8 @@ public:
     }
     // Deep: the other field's array is cloned. An empty array is not: the copy's
     // field stays empty and makes its own array when first read, so an array that a
-    // read created costs later copies nothing.
+    // read created costs later copies nothing. On purpose, such a copy's _GetSize is
+    // then its source's less that empty array.
     ArrayField(const ArrayField& other) {
         if (A* source = other.Peek(); source != nullptr && !source->IsEmpty()) {
             A* copy = static_cast<A*>(source->_Clone());
