@@ -62,6 +62,9 @@ public:
     // Objects take their memory from Kernite::Memory (kernite/Memory.h).
     static void* operator new(std::size_t size);
     static void operator delete(void* p) noexcept;
+    // Construction in storage of the caller's, which the class-level forms would hide.
+    static void* operator new(std::size_t, void* where) noexcept { return where; }
+    static void operator delete(void*, void*) noexcept {}
 
 protected:
     ObjectImpl() noexcept {
