@@ -127,6 +127,7 @@ const OutsideTexts& Outside() {
 }  // namespace TarnBench
 
 int main(int argc, char** argv) {
+    benchmark::AddCustomContext("object_allocator", Kernite::Memory::AllocatorName());
     benchmark::Initialize(&argc, argv);
     if (benchmark::ReportUnrecognizedArguments(argc, argv)) return 1;
     benchmark::RunSpecifiedBenchmarks();

@@ -115,7 +115,8 @@ def render(results, stats):
     load = context.get("load_avg") or []
     lines.append(
         f"Measured {context.get('date', '?')} on `{platform.node()}`: {os.cpu_count()} CPUs "
-        f"(`nproc`), {cpu_model()}, {context.get('mhz_per_cpu', '?')} MHz; load average at the start "
+        f"(`nproc`), {cpu_model()}, {context.get('mhz_per_cpu', '?')} MHz; our objects' memory from "
+        f"{context.get('object_allocator', '?')}; load average at the start "
         f"{', '.join(f'{x:.2f}' for x in load) if load else '?'}. Google Benchmark reports its own library "
         f"as a {context.get('library_build_type', '?')} build (Debian's package), which affects only its loop. "
         f"Times are CPU time per operation, median and minimum of "
