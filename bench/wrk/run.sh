@@ -2,11 +2,11 @@
 # The server's figure without our client: `wrk` (Debian's wrk, apt-get install wrk;
 # needed for this measurement only) posts DebugAcquireLock envelopes to the worked
 # example's server over keep-alive connections.
-#   bench/wrk/run.sh [BUILD-DIR] [CONNECTIONS] [SECONDS]   (build/bench-release, 16, 10)
+#   bench/wrk/run.sh [BUILD-DIR] [CONNECTIONS] [SECONDS]   (build/release, 16, 10)
 # The build directory is configured as bench/run.sh does when it is not yet.
 set -euo pipefail
 cd "$(dirname "$0")/../.."
-build=${1:-build/bench-release}
+build=${1:-build/release}
 connections=${2:-16}
 seconds=${3:-10}
 [ -f "$build/CMakeCache.txt" ] || cmake -S . -B "$build" -G Ninja -DCMAKE_BUILD_TYPE=Release >/dev/null

@@ -9,7 +9,8 @@
 namespace Orbit::Wire {
 namespace {
 
-constexpr const char* kVersion = "strata.version.version0";
+// The version every API version sees.
+constexpr const char* kVersion = kNoneVersion;
 
 void NoGet(DataObject*, int, void*) {}
 void NoSet(DataObject*, int, const void*) {}
