@@ -81,6 +81,9 @@ TEST(WireHostile, EachRefusalIsItsFaultNamingThePathAndLeavesNothing) {
         {"bad UTF-8", [&] { return Replace(good, ">x<", ">\xC0\xAF<"); }, typeid(MalformedMessage), ""},
         {"no envelope", [&] { return Replace(good, "http://schemas.xmlsoap.org/soap/envelope/", "urn:other"); },
          typeid(MalformedMessage), ""},
+        {"a header entry that must be understood",
+         [&] { return Replace(good, "<e:Body>", "<e:Header><audit xmlns=\"urn:elsewhere\" e:mustUnderstand=\"1\"/></e:Header><e:Body>"); },
+         typeid(UnknownElement), "/Header/audit"},
         {"an unknown element", [&] { return Replace(good, "<mode>", "<color>red</color><mode>"); },
          typeid(UnknownElement), "/DebugAcquireLock/color"},
         {"a repeated member", [&] { return Replace(good, "<mode>", "<mode>s</mode><mode>"); },
@@ -151,7 +154,8 @@ TEST(WireHostile, EachRefusalIsItsFaultNamingThePathAndLeavesNothing) {
 TEST(WireHostile, ARequestInAnotherClientsStyleIsRead) {
     const std::string body = R"(<?xml version='1.0' encoding='utf-8'?>
 <soap-env:Envelope xmlns:soap-env="http://schemas.xmlsoap.org/soap/envelope/">
-  <soap-env:Header><trace xmlns="urn:elsewhere"><hop>1</hop></trace></soap-env:Header>
+  <soap-env:Header><trace xmlns="urn:elsewhere"><hop>1</hop></trace>
+    <relay xmlns="urn:elsewhere" soap-env:mustUnderstand="1" soap-env:actor="urn:another-hop"/></soap-env:Header>
   <soap-env:Body>
     <ns0:DebugAcquireLock xmlns:ns0="urn:tarnd3">
       <ns0:target moType="tarn.LockStresser">stresser-1</ns0:target>

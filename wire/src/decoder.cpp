@@ -156,7 +156,7 @@ pugi::xml_node Decoder::Body(std::string_view body) {
     if (!child) ThrowFault<MalformedMessage>("", "an envelope without a body");
     Entered part = Enter(child);
     if (part.ns == Ns::Soap && part.local == "Header") {
-        Skip(child);
+        SkipHeader(child);
         Leave(part);
         child = NextElement(child.next_sibling());
         if (!child) ThrowFault<MalformedMessage>("", "an envelope without a body");
@@ -171,7 +171,36 @@ pugi::xml_node Decoder::Body(std::string_view body) {
     return content;
 }
 
-// Header entries are not ours to read, but they count against the limits.
+// Header entries are not ours to read, but they count against the limits. We
+// understand none, so an entry meant for us that must be understood is refused:
+// skipping it would answer as if its condition had been met.
+void Decoder::SkipHeader(pugi::xml_node header) {
+    for (pugi::xml_node entry = header.first_child(); entry; entry = entry.next_sibling()) {
+        if (entry.type() != pugi::node_element) continue;
+        const Entered entered = Enter(entry);
+        if (MustUnderstand(entry))
+            ThrowFault<UnknownElement>("/Header/" + std::string(entered.local),
+                                       "a header entry that must be understood; none is understood here");
+        Skip(entry);
+        Leave(entered);
+    }
+}
+
+bool Decoder::MustUnderstand(pugi::xml_node entry) const {
+    bool must = false;
+    bool forUs = true;
+    for (pugi::xml_attribute a = entry.first_attribute(); a; a = a.next_attribute()) {
+        const std::string_view name = a.name();
+        if (name.starts_with("xmlns") && (name.size() == 5 || name[5] == ':')) continue;
+        std::string_view local;
+        if (Resolve(name, local, true) != Ns::Soap) continue;
+        const std::string_view value = a.value();
+        if (local == "mustUnderstand") must = value == "1" || value == "true";
+        else if (local == "actor") forUs = value == kNextActor;
+    }
+    return must && forUs;
+}
+
 void Decoder::Skip(pugi::xml_node node) {
     for (pugi::xml_node child = node.first_child(); child; child = child.next_sibling()) {
         if (child.type() != pugi::node_element) continue;

@@ -59,6 +59,8 @@ private:
     void LeaveOurs(const Entered& entered);
     Ns Resolve(std::string_view qname, std::string_view& local, bool attribute) const;
     Ns NamespaceOf(std::string_view uri) const;
+    void SkipHeader(pugi::xml_node header);
+    bool MustUnderstand(pugi::xml_node entry) const;
     void Skip(pugi::xml_node node);
     bool IsFault(pugi::xml_node element);
     Kernite::Ref<MethodFault> ReadFault(pugi::xml_node fault);

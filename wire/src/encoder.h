@@ -11,6 +11,8 @@
 namespace Orbit::Wire {
 
 inline constexpr std::string_view kSoapNamespace = "http://schemas.xmlsoap.org/soap/envelope/";
+// The actor of a header entry meant for whoever receives the message first.
+inline constexpr std::string_view kNextActor = "http://schemas.xmlsoap.org/soap/actor/next";
 inline constexpr std::string_view kXsdNamespace = "http://www.w3.org/2001/XMLSchema";
 inline constexpr std::string_view kXsiNamespace = "http://www.w3.org/2001/XMLSchema-instance";
 

@@ -30,6 +30,10 @@
 //   does not see as the nearest base it sees, and refuses an element, a method or an
 //   xsi:type it does not see.
 //
+// A SOAP Header is read past (its entries count against the limits), except that an
+// entry for this end (no actor, or the "next" actor) marked mustUnderstand="1" is
+// refused, as none is understood here.
+//
 // Decoding is strict (Faults.h lists what is refused): no DTD, no entity other than
 // the five predefined ones and character references, limits on size, depth and
 // element count. A failed decode throws the fault's own exception and leaves nothing

@@ -9,7 +9,8 @@
 //     strata.wire.MalformedMessage  not well-formed XML, a DOCTYPE, an entity
 //                                   reference, bad UTF-8, not a SOAP 1.1 envelope
 //     strata.wire.UnknownElement    an element or attribute that is not expected
-//                                   here, or that the API version does not see
+//                                   here, or that the API version does not see; a
+//                                   header entry for us marked mustUnderstand
 //     strata.wire.MissingElement    a required member is absent
 //     strata.wire.InvalidValue      text that is not a value of the declared type:
 //                                   wrong lexical form, number out of range,
