@@ -140,10 +140,7 @@ void DataArrayBase::_DiffProperties(Any* other, const std::string& path, Propert
 }
 
 DataObjectArrayBase::DataObjectArrayBase(const DataObjectArrayBase& other) : DataArrayBase() {
-    if (other._size > kInlineItems) {
-        _items = static_cast<Any**>(Kernite::Memory::Allocate(sizeof(Any*) * other._size));
-        _capacity = other._size;
-    }
+    Reserve(other._size);
     // Cloned one by one, so that a failing clone leaves a consistent array for the
     // destructor to release.
     try {
@@ -174,13 +171,15 @@ void DataObjectArrayBase::Clear() {
 }
 
 void DataObjectArrayBase::Grow(int capacity) {
-    if (capacity <= _capacity) return;
-    const int grown = std::max(capacity, _capacity * 2);
-    auto** items = static_cast<Any**>(Kernite::Memory::Allocate(sizeof(Any*) * static_cast<std::size_t>(grown)));
+    if (capacity > _capacity) Reallocate(std::max(capacity, _capacity * 2));
+}
+
+void DataObjectArrayBase::Reallocate(int capacity) {
+    auto** items = static_cast<Any**>(Kernite::Memory::Allocate(sizeof(Any*) * static_cast<std::size_t>(capacity)));
     std::copy(_items, _items + _size, items);
     if (_items != _inline) Kernite::Memory::Free(_items);
     _items = items;
-    _capacity = grown;
+    _capacity = capacity;
 }
 
 void DataObjectArrayBase::RemoveAt(int index) {
@@ -193,13 +192,7 @@ void DataObjectArrayBase::RemoveAt(int index) {
 
 void DataObjectArrayBase::Reserve(int capacity) {
     if (capacity < 0) Kernite::PanicAssert("capacity >= 0", "orbit/array", __LINE__);
-    if (capacity > _capacity) {
-        auto** items = static_cast<Any**>(Kernite::Memory::Allocate(sizeof(Any*) * static_cast<std::size_t>(capacity)));
-        std::copy(_items, _items + _size, items);
-        if (_items != _inline) Kernite::Memory::Free(_items);
-        _items = items;
-        _capacity = capacity;
-    }
+    if (capacity > _capacity) Reallocate(capacity);
 }
 
 // The inline items are part of the object; a separate block counts on its own.

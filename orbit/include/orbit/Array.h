@@ -130,6 +130,8 @@ protected:
 private:
     // Room for at least `capacity` items, growing geometrically.
     void Grow(int capacity);
+    // Moves the items to a separate block of exactly `capacity` (more than held).
+    void Reallocate(int capacity);
 
     Any** _items = _inline;  // each non-null item holds one reference
     int _size = 0;
