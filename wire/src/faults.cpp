@@ -59,21 +59,11 @@ struct KindRecord {
         kNoProperties, NoGet, NoSet, AlwaysSet, NoUnset, Create, CreateArray};
 };
 
-#define ORBIT_WIRE_KIND(Name)                                                                       \
+#define ORBIT_WIRE_KIND(Name, Base)                                                                 \
     template <>                                                                                     \
     const TypeInfo KindRecord<Name>::header{Kind::Fault, "strata.wire." #Name, "StrataWire" #Name, \
                                             kVersion};
-ORBIT_WIRE_KIND(MalformedMessage)
-ORBIT_WIRE_KIND(UnknownElement)
-ORBIT_WIRE_KIND(MissingElement)
-ORBIT_WIRE_KIND(InvalidValue)
-ORBIT_WIRE_KIND(LimitExceeded)
-ORBIT_WIRE_KIND(UnknownMethod)
-ORBIT_WIRE_KIND(UnknownVersion)
-ORBIT_WIRE_KIND(UnknownObject)
-ORBIT_WIRE_KIND(NotAuthenticated)
-ORBIT_WIRE_KIND(NotAuthorized)
-ORBIT_WIRE_KIND(ServerFault)
+ORBIT_WIRE_FAULT_KINDS(ORBIT_WIRE_KIND)
 #undef ORBIT_WIRE_KIND
 
 }  // namespace
@@ -81,10 +71,9 @@ ORBIT_WIRE_KIND(ServerFault)
 void RegisterFaultTypes() {
     static const bool registered = [] {
         TypeMap* map = GetTypeMap();
-        for (Type* type : {GetType<InvalidRequest>(), GetType<MalformedMessage>(), GetType<UnknownElement>(),
-                           GetType<MissingElement>(), GetType<InvalidValue>(), GetType<LimitExceeded>(),
-                           GetType<UnknownMethod>(), GetType<UnknownVersion>(), GetType<UnknownObject>(),
-                           GetType<NotAuthenticated>(), GetType<NotAuthorized>(), GetType<ServerFault>()})
+#define ORBIT_WIRE_TYPE(Name, Base) GetType<Name>(),
+        for (Type* type : {GetType<InvalidRequest>(), ORBIT_WIRE_FAULT_KINDS(ORBIT_WIRE_TYPE)})
+#undef ORBIT_WIRE_TYPE
             map->AddType(type);
         return true;
     }();
@@ -119,22 +108,12 @@ template <> Type* GetType<Wire::InvalidRequest>() {
     return type;
 }
 
-#define ORBIT_WIRE_GET_TYPE(Name)                                                      \
+#define ORBIT_WIRE_GET_TYPE(Name, Base)                                                \
     template <> Type* GetType<Wire::Name>() {                                          \
         static Type* const type = CreateDataObjectType(&Wire::KindRecord<Wire::Name>::record); \
         return type;                                                                   \
     }
-ORBIT_WIRE_GET_TYPE(MalformedMessage)
-ORBIT_WIRE_GET_TYPE(UnknownElement)
-ORBIT_WIRE_GET_TYPE(MissingElement)
-ORBIT_WIRE_GET_TYPE(InvalidValue)
-ORBIT_WIRE_GET_TYPE(LimitExceeded)
-ORBIT_WIRE_GET_TYPE(UnknownMethod)
-ORBIT_WIRE_GET_TYPE(UnknownVersion)
-ORBIT_WIRE_GET_TYPE(UnknownObject)
-ORBIT_WIRE_GET_TYPE(NotAuthenticated)
-ORBIT_WIRE_GET_TYPE(NotAuthorized)
-ORBIT_WIRE_GET_TYPE(ServerFault)
+ORBIT_WIRE_FAULT_KINDS(ORBIT_WIRE_GET_TYPE)
 #undef ORBIT_WIRE_GET_TYPE
 
 }  // namespace Orbit

@@ -86,31 +86,26 @@ public:
     Exception* CreateException() override { return new Exception(_GetType()->GetName(), this); }
 };
 
-template <class Tag>
-using RequestFaultKind = FaultKind<Tag, InvalidRequest>;
+// Every kind but InvalidRequest itself, with its base: X(Name, Base). Declarations,
+// records, type objects and registration are all made from this one list.
+#define ORBIT_WIRE_FAULT_KINDS(X)       \
+    X(MalformedMessage, InvalidRequest) \
+    X(UnknownElement, InvalidRequest)   \
+    X(MissingElement, InvalidRequest)   \
+    X(InvalidValue, InvalidRequest)     \
+    X(LimitExceeded, InvalidRequest)    \
+    X(UnknownMethod, InvalidRequest)    \
+    X(UnknownVersion, InvalidRequest)   \
+    X(UnknownObject, InvalidRequest)    \
+    X(NotAuthenticated, MethodFault)    \
+    X(NotAuthorized, MethodFault)       \
+    X(ServerFault, MethodFault)
 
-struct MalformedMessageTag;
-struct UnknownElementTag;
-struct MissingElementTag;
-struct InvalidValueTag;
-struct LimitExceededTag;
-struct UnknownMethodTag;
-struct UnknownVersionTag;
-struct UnknownObjectTag;
-struct NotAuthenticatedTag;
-struct NotAuthorizedTag;
-struct ServerFaultTag;
-using MalformedMessage = RequestFaultKind<MalformedMessageTag>;
-using UnknownElement = RequestFaultKind<UnknownElementTag>;
-using MissingElement = RequestFaultKind<MissingElementTag>;
-using InvalidValue = RequestFaultKind<InvalidValueTag>;
-using LimitExceeded = RequestFaultKind<LimitExceededTag>;
-using UnknownMethod = RequestFaultKind<UnknownMethodTag>;
-using UnknownVersion = RequestFaultKind<UnknownVersionTag>;
-using UnknownObject = RequestFaultKind<UnknownObjectTag>;
-using NotAuthenticated = FaultKind<NotAuthenticatedTag, MethodFault>;
-using NotAuthorized = FaultKind<NotAuthorizedTag, MethodFault>;
-using ServerFault = FaultKind<ServerFaultTag, MethodFault>;
+#define ORBIT_WIRE_DECLARE_KIND(Name, Base) \
+    struct Name##Tag;                       \
+    using Name = FaultKind<Name##Tag, Base>;
+ORBIT_WIRE_FAULT_KINDS(ORBIT_WIRE_DECLARE_KIND)
+#undef ORBIT_WIRE_DECLARE_KIND
 
 // Throws a new fault of class F with `path` and the message "<path>: <what>".
 template <class F>
@@ -137,15 +132,7 @@ bool IsClientFault(const MethodFault& fault);
 
 namespace Orbit {
 template <> Type* GetType<Wire::InvalidRequest>();
-template <> Type* GetType<Wire::MalformedMessage>();
-template <> Type* GetType<Wire::UnknownElement>();
-template <> Type* GetType<Wire::MissingElement>();
-template <> Type* GetType<Wire::InvalidValue>();
-template <> Type* GetType<Wire::LimitExceeded>();
-template <> Type* GetType<Wire::UnknownMethod>();
-template <> Type* GetType<Wire::UnknownVersion>();
-template <> Type* GetType<Wire::UnknownObject>();
-template <> Type* GetType<Wire::NotAuthenticated>();
-template <> Type* GetType<Wire::NotAuthorized>();
-template <> Type* GetType<Wire::ServerFault>();
+#define ORBIT_WIRE_DECLARE_GET_TYPE(Name, Base) template <> Type* GetType<Wire::Name>();
+ORBIT_WIRE_FAULT_KINDS(ORBIT_WIRE_DECLARE_GET_TYPE)
+#undef ORBIT_WIRE_DECLARE_GET_TYPE
 }  // namespace Orbit
