@@ -82,6 +82,11 @@ bool Answers(ManagedObject* target, const ManagedMethod* method) {
            targetType->IsA(declaring);
 }
 
+std::string Describe(const ManagedMethod* method) {
+    const ManagedObjectType* owner = method->GetDeclaringType();
+    return (owner ? owner->GetName() + "." : std::string()) + method->GetName();
+}
+
 void Dispatch(ManagedObject* target, ManagedMethod* method, Kernite::RefVector<Any>& args,
               Kernite::Ref<Any>& result, RequestContext* context) {
     ContextScope scope(context);

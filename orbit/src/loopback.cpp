@@ -15,11 +15,6 @@ namespace {
     throw MethodFault::Exception(fault->_GetType()->GetName(), fault.Get());
 }
 
-std::string Describe(const ManagedMethod* method) {
-    const ManagedObjectType* owner = method->GetDeclaringType();
-    return (owner ? owner->GetName() + "." : std::string()) + method->GetName();
-}
-
 }  // namespace
 
 LoopbackAdapter::LoopbackAdapter() = default;

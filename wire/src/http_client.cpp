@@ -69,11 +69,6 @@ std::string Base64(std::string_view text) {
     return out;
 }
 
-std::string Describe(const ManagedMethod* method) {
-    const ManagedObjectType* owner = method->GetDeclaringType();
-    return (owner ? owner->GetName() + "." : std::string()) + method->GetName();
-}
-
 // The answer as it came, before decoding.
 struct Reply {
     unsigned status = 0;

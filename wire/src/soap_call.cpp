@@ -47,11 +47,6 @@ bool DecodeBase64(std::string_view text, std::string& out) {
     return true;
 }
 
-std::string Describe(const ManagedMethod& method) {
-    const ManagedObjectType* owner = method.GetDeclaringType();
-    return (owner ? owner->GetName() + "." : std::string()) + method.GetName();
-}
-
 const Version& LastServiceVersion() {
     const Version* last = nullptr;
     for (Version* version : GetVersionMap()->GetVersions())
@@ -152,7 +147,7 @@ Answer SoapCalls::Call(std::string_view soapAction, std::string_view authorizati
         ManagedMethod* method = pending.GetMethod();
 
         if (const char* privilege = method->GetPrivilege(); privilege != nullptr && !identity.privileges.count(privilege))
-            ThrowServiceFault<NotAuthorized>(Describe(*method) + " needs the privilege " + privilege);
+            ThrowServiceFault<NotAuthorized>(Describe(method) + " needs the privilege " + privilege);
 
         const std::string& id = pending.GetTarget()->GetId();
         const std::string targetPath = "/" + pending.GetOperation() + "/target";
@@ -160,7 +155,7 @@ Answer SoapCalls::Call(std::string_view soapAction, std::string_view authorizati
         if (!target) ThrowFault<UnknownObject>(targetPath, "no object '" + id + "' is hosted here");
         if (!Answers(target.Get(), method))
             ThrowFault<UnknownMethod>(targetPath, "the object '" + id + "' of type " + target->_GetType()->GetName() +
-                                                      " has no member " + Describe(*method));
+                                                      " has no member " + Describe(method));
 
         Kernite::RefVector<Any> args = pending.DecodeArguments();
         const Kernite::Ref<RequestContext> context = ContextOf(identity, *version, peer);
@@ -177,7 +172,7 @@ Answer SoapCalls::Call(std::string_view soapAction, std::string_view authorizati
         try {
             return Answer{200, kXmlContentType, codec.EncodeResponse(*method, result.Get())};
         } catch (const Kernite::Exception& e) {
-            ThrowServiceFault<ServerFault>("the result of " + Describe(*method) + " cannot be sent: " + e.what());
+            ThrowServiceFault<ServerFault>("the result of " + Describe(method) + " cannot be sent: " + e.what());
         }
     } catch (const MethodFault::Exception& e) {
         return FaultAnswer(*version, *e.GetFault());

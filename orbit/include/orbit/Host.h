@@ -43,6 +43,9 @@ private:
 // declaring type, which the target's type is or derives from.
 bool Answers(ManagedObject* target, const ManagedMethod* method);
 
+// "<declaring type>.<method>", as messages name a member.
+std::string Describe(const ManagedMethod* method);
+
 // Calls `method` of `target` through its declaring type's invokeMember, with
 // `context` as the context of the call served on this thread meanwhile. The
 // caller has checked Answers(target, method).
